@@ -1,0 +1,33 @@
+# The two commands of a new machine: `make` builds and runs the tour, `make test` runs the
+# test suite. Both install what is missing first.
+BUILD := build
+CMAKE_FLAGS := -DCMAKE_TOOLCHAIN_FILE=cmake/toolchain-i686-mingw.cmake -DCMAKE_BUILD_TYPE=Release
+JOBS := $(shell nproc 2>/dev/null || echo 2)
+
+.PHONY: all setup configure build tour test bench format clean
+
+all: tour
+
+setup:
+	@scripts/setup
+
+configure: setup
+	@test -f $(BUILD)/CMakeCache.txt || cmake -S . -B $(BUILD) $(CMAKE_FLAGS) >/dev/null
+
+build: configure
+	@cmake --build $(BUILD) -j $(JOBS)
+
+tour: build
+	@scripts/testbed scripts/tour
+
+test: build
+	@scripts/testbed ctest --test-dir $(BUILD) --output-on-failure -j $(JOBS) --timeout 300
+
+bench: build
+	@scripts/testbed scripts/bench
+
+format:
+	@clang-format -i $$(git ls-files '*.cpp' '*.h')
+
+clean:
+	rm -rf $(BUILD) dist

@@ -1,0 +1,186 @@
+// Bridge core: the text conversions (linked in directly) and the CoreNativeNT exports.
+#include <windows.h>
+#include <shlobj.h>
+
+#include <cstring>
+#include <string>
+
+#include "bridge/text_conversion.h"
+#include "host_fixture.h"
+
+namespace {
+
+const char kGetCursorPos[] = "_Java_com_velmor_coreutil_corenative_CoreNativeNT_getCursorPos@8";
+const char kSetCursorPos[] = "_Java_com_velmor_coreutil_corenative_CoreNativeNT_setCursorPos@12";
+const char kGetEnv[] = "_Java_com_velmor_coreutil_corenative_CoreNativeNT_getEnvVariable@12";
+const char kSpecialFolder[] = "_Java_com_velmor_coreutil_corenative_CoreNativeNT_getSpecialFolderLocation@12";
+
+std::string native(JNIEnv* env, jstring s) {
+    NativeText text(toNativeString(env, s));
+    EXPECT_NE(text, nullptr);
+    return text ? std::string(text.get()) : std::string("<null>");
+}
+
+POINT cursor() {
+    POINT p{-1, -1};
+    GetCursorPos(&p);
+    return p;
+}
+
+using TextConversion = HostTest;
+
+TEST_F(TextConversion, EmptyTextStaysEmptyNotNull) {
+    NativeText text(toNativeString(env(), vm.newString(u"")));
+    ASSERT_NE(text, nullptr);
+    EXPECT_EQ(text.get()[0], '\0');
+
+    jstring back = toJavaString(env(), "");
+    ASSERT_NE(back, nullptr);
+    EXPECT_EQ(vm.stringValue(back), u"");
+}
+
+TEST_F(TextConversion, CharacterOutsideCodePageBecomesDefaultCharacter) {
+    EXPECT_EQ(native(env(), vm.newString(u"a\u4e2d\u00e9b")), "a?\xe9" "b");
+}
+
+TEST_F(TextConversion, EmbeddedNulEndsTheNativeText) {
+    const std::u16string withNul(u"ab\0cd", 5);
+    NativeText text(toNativeString(env(), vm.newString(withNul)));
+    ASSERT_NE(text, nullptr);
+    EXPECT_STREQ(text.get(), "ab");
+    EXPECT_EQ(std::memcmp(text.get(), "ab\0cd", 6), 0) << "the whole string is converted";
+}
+
+TEST_F(TextConversion, CodePageTextRoundTripsByteForByte) {
+    std::string all;
+    for (int c = 1; c < 256; ++c) {
+        char ch = static_cast<char>(c);
+        WCHAR w = 0;
+        // Only bytes that the code page defines; a few of 0x80-0x9F are unassigned in 1252.
+        if (MultiByteToWideChar(CP_ACP, MB_ERR_INVALID_CHARS, &ch, 1, &w, 1) == 1 && !IsDBCSLeadByte(ch)) {
+            all.push_back(ch);
+        }
+    }
+    ASSERT_GT(all.size(), 200u);
+    jstring java = toJavaString(env(), all.c_str());
+    ASSERT_NE(java, nullptr);
+    EXPECT_EQ(vm.stringValue(java).size(), all.size());
+    EXPECT_EQ(native(env(), java), all);
+}
+
+TEST_F(TextConversion, LongTextNeedsNoFixedBuffer) {
+    std::u16string text(100000, u'x');
+    text += u"end";
+    const std::string back = native(env(), vm.newString(text));
+    EXPECT_EQ(back.size(), 100003u);
+    EXPECT_EQ(vm.stringValue(toJavaString(env(), back.c_str())), text);
+}
+
+using Cursor = HostTest;
+
+TEST_F(Cursor, SetThenGetReadsThePointBack) {
+    EXPECT_EQ(lib.call<jboolean>(kSetCursorPos, jclass{}, vm.newPoint(123, 456)), JNI_TRUE);
+    jobject point = lib.call<jobject>(kGetCursorPos, jclass{});
+    ASSERT_NE(point, nullptr);
+    EXPECT_EQ(vm.classNameOf(point), "java/awt/Point");
+    EXPECT_EQ(vm.pointValue(point), std::make_pair(123, 456));
+}
+
+TEST_F(Cursor, SubclassOfPointIsReadThroughInheritedFields) {
+    EXPECT_EQ(lib.call<jboolean>(kSetCursorPos, jclass{}, vm.newPoint(40, 70, true)), JNI_TRUE);
+    EXPECT_EQ(cursor().x, 40);
+    EXPECT_EQ(cursor().y, 70);
+}
+
+TEST_F(Cursor, NullPointIsRefusedAndCursorStays) {
+    SetCursorPos(10, 20);
+    EXPECT_EQ(lib.call<jboolean>(kSetCursorPos, jclass{}, jobject{}), JNI_FALSE);
+    EXPECT_EQ(cursor().x, 10);
+    EXPECT_EQ(cursor().y, 20);
+    EXPECT_EQ(vm.callCount("FindClass"), 0);
+}
+
+TEST_F(Cursor, MissingPointClassOrMemberLeavesTheErrorPending) {
+    SetCursorPos(10, 20);
+    vm.failFindClass("java/awt/Point");
+    EXPECT_EQ(lib.call<jobject>(kGetCursorPos, jclass{}), nullptr);
+    EXPECT_EQ(takeException(), "java/lang/NoClassDefFoundError");
+    EXPECT_EQ(lib.call<jboolean>(kSetCursorPos, jclass{}, vm.newPoint(1, 2)), JNI_FALSE);
+    EXPECT_EQ(takeException(), "java/lang/NoClassDefFoundError");
+    vm.clearFailures();
+
+    vm.failMemberLookup("java/awt/Point", "<init>");
+    EXPECT_EQ(lib.call<jobject>(kGetCursorPos, jclass{}), nullptr);
+    EXPECT_EQ(takeException(), "java/lang/NoSuchMethodError");
+
+    vm.failMemberLookup("java/awt/Point", "y");
+    EXPECT_EQ(lib.call<jboolean>(kSetCursorPos, jclass{}, vm.newPoint(1, 2)), JNI_FALSE);
+    EXPECT_EQ(takeException(), "java/lang/NoSuchFieldError");
+    EXPECT_EQ(cursor().x, 10) << "the cursor must not move on a failed lookup";
+}
+
+using Environment = HostTest;
+
+TEST_F(Environment, DefinedVariableComesBack) {
+    ASSERT_TRUE(SetEnvironmentVariableA("TESSEL_TEST_VALUE", "some value=1"));
+    jstring value = lib.call<jstring>(kGetEnv, jclass{}, vm.newString(u"TESSEL_TEST_VALUE"));
+    ASSERT_NE(value, nullptr);
+    EXPECT_EQ(vm.stringValue(value), u"some value=1");
+}
+
+TEST_F(Environment, UndefinedOrNullNameGivesNull) {
+    SetEnvironmentVariableA("TESSEL_TEST_UNDEFINED", nullptr);
+    EXPECT_EQ(lib.call<jstring>(kGetEnv, jclass{}, vm.newString(u"TESSEL_TEST_UNDEFINED")), nullptr);
+    EXPECT_EQ(lib.call<jstring>(kGetEnv, jclass{}, jstring{}), nullptr);
+    EXPECT_FALSE(vm.exceptionPending());
+}
+
+TEST_F(Environment, ValueOutsideCodePageComesBackWithDefaultCharacter) {
+    ASSERT_TRUE(SetEnvironmentVariableW(L"TESSEL_TEST_WIDE", L"caf\u00e9 \u4e2d"));
+    jstring value = lib.call<jstring>(kGetEnv, jclass{}, vm.newString(u"TESSEL_TEST_WIDE"));
+    ASSERT_NE(value, nullptr);
+    EXPECT_EQ(vm.stringValue(value), u"caf\u00e9 ?");
+}
+
+using SpecialFolder = HostTest;
+
+TEST_F(SpecialFolder, DocumentsFolderIsAnExistingPath) {
+    jstring path = lib.call<jstring>(kSpecialFolder, jclass{}, jint{CSIDL_PERSONAL});
+    ASSERT_NE(path, nullptr);
+    const std::string text = jnihost::utf8(vm.stringValue(path));
+    ASSERT_GT(text.size(), 3u);
+    EXPECT_EQ(text.substr(1, 2), ":\\");
+    const DWORD attributes = GetFileAttributesA(text.c_str());
+    ASSERT_NE(attributes, INVALID_FILE_ATTRIBUTES) << text;
+    EXPECT_TRUE(attributes & FILE_ATTRIBUTE_DIRECTORY);
+}
+
+TEST_F(SpecialFolder, UnknownIdGivesNull) {
+    EXPECT_EQ(lib.call<jstring>(kSpecialFolder, jclass{}, jint{0x7ff0}), nullptr);
+    EXPECT_EQ(lib.call<jstring>(kSpecialFolder, jclass{}, jint{-1}), nullptr);
+}
+
+// Under a double-byte ANSI code page (started with a Japanese locale), sizes are bytes.
+using Acp932 = HostTest;
+
+TEST_F(Acp932, ConversionsSizeByBytesNotCharacters) {
+    if (GetACP() != 932) {
+        GTEST_SKIP() << "needs ANSI code page 932; ctest runs this under a Japanese locale";
+    }
+    const std::u16string kanji = u"\u65e5\u672c\u8a9e-x";  // three kanji, two bytes each
+    const std::string text = native(env(), vm.newString(kanji));
+    EXPECT_EQ(text.size(), 8u);
+    EXPECT_EQ(vm.stringValue(toJavaString(env(), text.c_str())), kanji);
+}
+
+TEST_F(Acp932, DoubleByteVariableNameIsFound) {
+    if (GetACP() != 932) {
+        GTEST_SKIP() << "needs ANSI code page 932";
+    }
+    ASSERT_TRUE(SetEnvironmentVariableW(L"TESSEL_\u65e5\u672c", L"ascii value"));
+    jstring value = lib.call<jstring>(kGetEnv, jclass{}, vm.newString(u"TESSEL_\u65e5\u672c"));
+    ASSERT_NE(value, nullptr);
+    EXPECT_EQ(vm.stringValue(value), u"ascii value");
+}
+
+}  // namespace

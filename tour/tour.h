@@ -1,0 +1,6 @@
+// The tour: a short walk through the library for a person to watch, one section a family.
+#pragma once
+
+#include "jnihost.h"
+
+void tourDesktop(jnihost::Vm& vm, jnihost::Library& lib);
