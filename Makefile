@@ -1,6 +1,8 @@
 # The two commands of a new machine: `make` builds and runs the tour, `make test` runs the
 # test suite. Both install what is missing first.
 BUILD := build
+# The scripts find the build tree (and its Wine prefix) through this.
+export TESSEL_BUILD := $(abspath $(BUILD))
 CMAKE_FLAGS := -DCMAKE_TOOLCHAIN_FILE=cmake/toolchain-i686-mingw.cmake -DCMAKE_BUILD_TYPE=Release
 JOBS := $(shell nproc 2>/dev/null || echo 2)
 
