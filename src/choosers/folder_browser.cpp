@@ -1,0 +1,175 @@
+// nativeBrowseForFolder and nativeSetStatus: the shell folder browser, owned by the
+// process's first top-level window, with a Java validator behind its OK button.
+#include "choosers/folder_browser.h"
+
+#include <memory>
+
+#include "bridge/text_conversion.h"
+#include "choosers/chooser_window.h"
+#include "com_velmor_coreutil_hack_HackWindowsDirectoryChooser.h"
+
+namespace {
+
+static_assert(sizeof(BROWSEINFOA) == 32, "BROWSEINFOA of 32-bit Windows");
+
+const char kValidatorInterface[] = "com/velmor/coreutil/hack/HackWindowsDirectoryValidator";
+const char kValidatorSignature[] = "Lcom/velmor/coreutil/hack/HackWindowsDirectoryValidator;";
+
+// Owns the item list the dialog returns; the shell's allocator frees it. When the
+// allocator cannot be had, the list is left alone rather than freed by the wrong heap.
+struct ItemListDeleter {
+    void operator()(ITEMIDLIST* list) const {
+        IMalloc* allocator = nullptr;
+        if (SUCCEEDED(SHGetMalloc(&allocator))) {
+            allocator->Free(list);
+            allocator->Release();
+        }
+    }
+};
+using ItemList = std::unique_ptr<ITEMIDLIST, ItemListDeleter>;
+
+// A handle in "hwnd" outlives its dialog, and Windows may give it to another window,
+// even one of another process; the status text goes only to a live window of ours.
+bool isWindowOfThisProcess(HWND window) {
+    DWORD owner = 0;
+    return GetWindowThreadProcessId(window, &owner) != 0 && owner == GetCurrentProcessId();
+}
+
+}  // namespace
+
+char* getStringFieldByName(JNIEnv* env, jobject obj, const char* className, const char* fieldName,
+                           bool* failed) {
+    *failed = false;
+    jfieldID field = findFieldByName(env, className, fieldName, "Ljava/lang/String;");
+    if (field == nullptr) {
+        return nullptr;
+    }
+    auto value = static_cast<jstring>(env->GetObjectField(obj, field));
+    if (value == nullptr) {
+        return nullptr;
+    }
+    char* text = toNativeString(env, value);
+    *failed = text == nullptr;
+    return text;
+}
+
+int callValidator(JNIEnv* env, jobject validator, const char* path) {
+    // Looked up on the interface, so any implementing class answers.
+    jclass validatorInterface = env->FindClass(kValidatorInterface);
+    if (validatorInterface == nullptr) {
+        return 1;
+    }
+    jmethodID validate = env->GetMethodID(validatorInterface, "validateDirectory", "(Ljava/lang/String;)Z");
+    if (validate == nullptr) {
+        return 1;
+    }
+    jstring javaPath = toJavaString(env, path);
+    if (javaPath == nullptr) {
+        return -1;
+    }
+    // A validator that throws answers false; its exception stays pending for Java.
+    return env->CallBooleanMethod(validator, validate, javaPath) ? 1 : 0;
+}
+
+void onBrowseInitialized(JNIEnv* env, jobject obj, HWND dialog) {
+    // First the handle, so that nativeSetStatus reaches the dialog from here on.
+    storeWindowHandle(env, obj, kDirectoryChooserClass, dialog);
+    centerWindowAt(env, obj, kDirectoryChooserClass, dialog);
+    bool failed = false;
+    NativeText start(getStringFieldByName(env, obj, kDirectoryChooserClass, "startpath", &failed));
+    if (start) {
+        // Sent even for a path that names no folder: the dialog decides what to do with it.
+        SendMessageA(dialog, BFFM_SETSELECTIONA, TRUE, reinterpret_cast<LPARAM>(start.get()));
+    }
+}
+
+void onSelectionChanged(JNIEnv* env, jobject obj, HWND dialog, LPCITEMIDLIST selection) {
+    // Read at every change, so a validator Java replaces while the dialog is open counts
+    // from the next selection on.
+    jfieldID field = findFieldByName(env, kDirectoryChooserClass, "validator", kValidatorSignature);
+    if (field == nullptr) {
+        return;
+    }
+    jobject validator = env->GetObjectField(obj, field);
+    if (validator == nullptr) {
+        return;  // OK keeps the state the dialog gave it
+    }
+    char path[MAX_PATH] = {};
+    if (!SHGetPathFromIDListA(selection, path)) {
+        return;  // no file-system path: nothing to ask about
+    }
+    const int ok = callValidator(env, validator, path);
+    if (ok < 0) {
+        return;
+    }
+    SendMessageA(dialog, BFFM_ENABLEOK, 0, ok);
+}
+
+int CALLBACK browseCallback(HWND dialog, UINT message, LPARAM lParam, LPARAM lpData) {
+    const auto* context = reinterpret_cast<const ChooserContext*>(lpData);
+    if (message == BFFM_INITIALIZED) {
+        onBrowseInitialized(context->env, context->obj, dialog);
+    } else if (message == BFFM_SELCHANGED) {
+        // Nothing more is asked of Java once an error is pending: it reaches Java when the
+        // dialog returns, and the OK button keeps its last state until then.
+        if (!javaErrorPending(context->env)) {
+            onSelectionChanged(context->env, context->obj, dialog, reinterpret_cast<LPCITEMIDLIST>(lParam));
+        }
+    }
+    return 0;
+}
+
+extern "C" {
+
+jstring JNICALL
+Java_com_velmor_coreutil_hack_HackWindowsDirectoryChooser_nativeBrowseForFolder(JNIEnv* env, jobject self) {
+    BROWSEINFOA browse;
+    ZeroMemory(&browse, sizeof browse);
+    browse.hwndOwner = findProcessWindow(GetCurrentProcessId());
+
+    bool failed = false;
+    NativeText title(getStringFieldByName(env, self, kDirectoryChooserClass, "title", &failed));
+    if (failed) {
+        return nullptr;  // out of memory: nothing shown
+    }
+    browse.lpszTitle = title.get();
+    browse.ulFlags = static_cast<UINT>(getLongFieldByName(env, self, kDirectoryChooserClass, "browseFlags"));
+
+    ChooserContext context{env, self};
+    browse.lpfn = browseCallback;
+    browse.lParam = reinterpret_cast<LPARAM>(&context);
+
+    ItemList chosen(SHBrowseForFolderA(&browse));
+    title.reset();
+    if (!chosen) {
+        return nullptr;  // cancel
+    }
+    char path[MAX_PATH] = {};
+    if (!SHGetPathFromIDListA(chosen.get(), path)) {
+        return nullptr;  // an item without a file-system path
+    }
+    if (javaErrorPending(env)) {
+        return nullptr;  // Java sees the pending error instead of a result
+    }
+    return toJavaString(env, path);
+}
+
+void JNICALL Java_com_velmor_coreutil_hack_HackWindowsDirectoryChooser_nativeSetStatus(JNIEnv* env,
+                                                                                       jobject self,
+                                                                                       jstring status) {
+    if (status == nullptr) {
+        return;
+    }
+    HWND dialog = windowFromJava(getLongFieldByName(env, self, kDirectoryChooserClass, "hwnd"));
+    if (dialog == nullptr || !isWindowOfThisProcess(dialog)) {
+        return;  // no dialog yet, or the handle no longer names one of ours
+    }
+    NativeText text(toNativeString(env, status));
+    if (!text) {
+        return;
+    }
+    // From another thread this waits until the dialog's thread has shown the text.
+    SendMessageA(dialog, BFFM_SETSTATUSTEXTA, 0, reinterpret_cast<LPARAM>(text.get()));
+}
+
+}  // extern "C"
