@@ -4,3 +4,4 @@
 #include "jnihost.h"
 
 void tourDesktop(jnihost::Vm& vm, jnihost::Library& lib);
+void tourRegistry(jnihost::Vm& vm, jnihost::Library& lib);
