@@ -45,41 +45,33 @@ RawValue rawValue(const std::string& path, const char* name) {
     return raw;
 }
 
-void setRawValue(const std::string& path, const char* name, DWORD type, const void* data, DWORD size) {
+// Creates the key (with the missing keys above it) and, given a name, sets that value.
+void setRawValue(const std::string& path, const char* name = nullptr, DWORD type = REG_NONE,
+                 const void* data = nullptr, DWORD size = 0) {
     HKEY key;
     ASSERT_EQ(RegCreateKeyExA(HKEY_CURRENT_USER, path.c_str(), 0, nullptr, 0, KEY_ALL_ACCESS, nullptr, &key,
                               nullptr),
               ERROR_SUCCESS);
-    EXPECT_EQ(RegSetValueExA(key, name, 0, type, static_cast<const BYTE*>(data), size), ERROR_SUCCESS);
-    RegCloseKey(key);
-}
-
-void createKey(const std::string& path) {
-    HKEY key;
-    ASSERT_EQ(RegCreateKeyExA(HKEY_CURRENT_USER, path.c_str(), 0, nullptr, 0, KEY_ALL_ACCESS, nullptr, &key,
-                              nullptr),
-              ERROR_SUCCESS);
-    RegCloseKey(key);
-}
-
-bool keyExists(const std::string& path) {
-    HKEY key;
-    if (RegOpenKeyExA(HKEY_CURRENT_USER, path.c_str(), 0, KEY_READ, &key) != ERROR_SUCCESS) {
-        return false;
+    if (name != nullptr) {
+        EXPECT_EQ(RegSetValueExA(key, name, 0, type, static_cast<const BYTE*>(data), size), ERROR_SUCCESS);
     }
     RegCloseKey(key);
-    return true;
 }
 
-DWORD subKeyCount(const std::string& path) {
+// The number of sub-keys of an existing key, -1 when the key does not exist.
+int subKeys(const std::string& path) {
     HKEY key;
     DWORD count = 0;
-    if (RegOpenKeyExA(HKEY_CURRENT_USER, path.c_str(), 0, KEY_READ, &key) == ERROR_SUCCESS) {
-        RegQueryInfoKeyA(key, nullptr, nullptr, nullptr, &count, nullptr, nullptr, nullptr, nullptr, nullptr,
-                         nullptr, nullptr);
-        RegCloseKey(key);
+    if (RegOpenKeyExA(HKEY_CURRENT_USER, path.c_str(), 0, KEY_READ, &key) != ERROR_SUCCESS) {
+        return -1;
     }
-    return count;
+    RegQueryInfoKeyA(key, nullptr, nullptr, nullptr, &count, nullptr, nullptr, nullptr, nullptr, nullptr,
+                     nullptr, nullptr);
+    RegCloseKey(key);
+    return static_cast<int>(count);
+}
+bool keyExists(const std::string& path) {
+    return subKeys(path) >= 0;
 }
 
 class Registry : public HostTest {
@@ -169,20 +161,15 @@ TEST_F(Registry, EachKindRoundTripsWithItsRegistryType) {
     ASSERT_NE(none, nullptr);
     EXPECT_EQ(vm.classNameOf(none), "[B");
     EXPECT_TRUE(vm.byteArrayValue(none).empty());
-    EXPECT_EQ(raised(), "");
-}
 
-TEST_F(Registry, NullNameAddressesTheDefaultValue) {
+    // A null name is the unnamed default value, as is an empty one.
     set(nullptr, str("default text"));
-    ASSERT_EQ(raised(), "");
-    EXPECT_EQ(rawValue(path, nullptr).data.size(), 13u);
+    EXPECT_EQ(rawValue(path, "").data.size(), 13u);
     EXPECT_EQ(vm.stringUtf8(get(nullptr)), "default text");
-    EXPECT_EQ(vm.stringUtf8(get(str(""))), "default text") << "an empty name is the same value";
-    EXPECT_EQ(describe(getAll()), (Entries{{"", "s:default text"}}));
-
+    EXPECT_EQ(vm.stringUtf8(get(str(""))), "default text");
     lib.call<void>(kDeleteValue, jclass{}, kCurrentUser, jpath, jstring{});
+    EXPECT_EQ(rawValue(path, "").result, ERROR_FILE_NOT_FOUND);
     EXPECT_EQ(raised(), "");
-    EXPECT_EQ(rawValue(path, nullptr).result, ERROR_FILE_NOT_FOUND);
 }
 
 TEST_F(Registry, TextIsSizedByItsConvertedBytes) {
@@ -205,7 +192,7 @@ TEST_F(Registry, TextIsSizedByItsConvertedBytes) {
     EXPECT_EQ(raised(), "");
 }
 
-TEST_F(Registry, StoredDataThatDoesNotFitItsTypeIsReadWithinItsBytes) {
+TEST_F(Registry, StoredDataIsReadWithinItsBytesAndOnlyInTheThreeKinds) {
     setRawValue(path, "unterminated", REG_SZ, "xyz", 3);
     setRawValue(path, "emptySz", REG_SZ, "", 0);
     const uint8_t eight[8] = {7, 0, 0, 0, 9, 9, 9, 9};
@@ -218,9 +205,7 @@ TEST_F(Registry, StoredDataThatDoesNotFitItsTypeIsReadWithinItsBytes) {
     EXPECT_EQ(raised(), "");
     EXPECT_EQ(get(str("shortDword")), nullptr);
     EXPECT_EQ(raised(), "Unable to convert MS registry value to java");
-}
 
-TEST_F(Registry, UnsupportedStoredTypesAreRefused) {
     const char data[] = "%PATH%\0second\0";
     const std::pair<const char*, DWORD> kinds[] = {
         {"expand", REG_EXPAND_SZ}, {"multi", REG_MULTI_SZ}, {"qword", REG_QWORD}, {"none", REG_NONE}};
@@ -230,14 +215,12 @@ TEST_F(Registry, UnsupportedStoredTypesAreRefused) {
         EXPECT_EQ(raised(), "Unable to convert MS registry value to java") << name;
     }
     // One such value fails the whole bulk read, however many were read before it.
-    set(str("a"), vm.newInteger(1));
-    set(str("z"), vm.newInteger(2));
     EXPECT_EQ(getAll(), nullptr);
     EXPECT_EQ(raised(), "Unable to convert MS registry value to java");
 }
 
 TEST_F(Registry, ReadFailuresRaiseTheirMessages) {
-    createKey(path);
+    setRawValue(path);
     EXPECT_EQ(get(str("missing")), nullptr);
     EXPECT_EQ(raised(), "RegQueryValueEx() call failed");
 
@@ -256,7 +239,7 @@ TEST_F(Registry, ReadFailuresRaiseTheirMessages) {
 }
 
 TEST_F(Registry, BulkReadGivesEveryValueByName) {
-    createKey(path);
+    setRawValue(path);
     jobject empty = getAll();
     ASSERT_NE(empty, nullptr);
     EXPECT_EQ(vm.classNameOf(empty), "java/util/Hashtable");
@@ -266,7 +249,7 @@ TEST_F(Registry, BulkReadGivesEveryValueByName) {
     set(str("s"), str("text"));
     set(str("i"), vm.newInteger(42));
     set(str("b"), vm.newByteArray({1, 2, 3}));
-    createKey(path + "\\child");  // sub-keys are no values
+    setRawValue(path + "\\child");  // sub-keys are no values
     EXPECT_EQ(describe(getAll()), (Entries{{"", "s:d"}, {"b", "b:3"}, {"i", "i:42"}, {"s", "s:text"}}));
     EXPECT_EQ(raised(), "");
 }
@@ -301,7 +284,7 @@ TEST_F(Registry, NameTooLongForTheBufferEndsTheBulkRead) {
 }
 
 TEST_F(Registry, FailedHashtableLookupsRaiseTheirFixedMessages) {
-    createKey(path);
+    setRawValue(path);
     const std::pair<std::string, const char*> member[] = {
         {"<init>", "Unable to get function IDs for Hashtable."},
         {"put", "Unable to get function IDs for Hashtable."}};
@@ -348,7 +331,7 @@ TEST_F(Registry, FailedConversionLeavesTheVirtualMachineErrorPending) {
     EXPECT_EQ(takeException(), "java/lang/NoClassDefFoundError");
 }
 
-TEST_F(Registry, WritesCreateTheKeyWithEveryMissingLevel) {
+TEST_F(Registry, WritesCreateEveryMissingLevelAndReadBackEqual) {
     lib.call<void>(kSetValue, jclass{}, kCurrentUser, sub("a\\b\\c"), str("v"), vm.newInteger(3));
     EXPECT_EQ(raised(), "");
     EXPECT_EQ(rawValue(path + "\\a\\b\\c", "v").data, (Bytes{3, 0, 0, 0}));
@@ -356,10 +339,20 @@ TEST_F(Registry, WritesCreateTheKeyWithEveryMissingLevel) {
     lib.call<void>(kSetValues, jclass{}, kCurrentUser, sub("x\\y"), vm.newHashtable());
     EXPECT_EQ(raised(), "");
     EXPECT_TRUE(keyExists(path + "\\x\\y")) << "an empty table still creates the key";
+
+    jobject table = vm.newHashtable();
+    vm.hashtablePut(table, str("s"), str("text"));
+    vm.hashtablePut(table, str("i"), vm.newInteger(-7));
+    vm.hashtablePut(table, str("b"), vm.newByteArray({9, 8}));
+    vm.hashtablePut(table, str(""), str("default"));
+    setAll(table);
+    EXPECT_EQ(raised(), "");
+    EXPECT_EQ(describe(getAll()), describe(table));
+    EXPECT_EQ(vm.byteArrayValue(get(str("b"))), (Bytes{9, 8}));
 }
 
 TEST_F(Registry, WriteFailuresRaiseTheirMessages) {
-    createKey(path);
+    setRawValue(path);
     set(str("v"), jobject{});
     EXPECT_EQ(raised(), "Cannot set registry value to null object");
     lib.call<void>(kSetValue, jclass{}, kCurrentUser, jstring{}, str("v"), jobject{});
@@ -387,19 +380,7 @@ TEST_F(Registry, WriteFailuresRaiseTheirMessages) {
     // Windows refuses a value name beyond 16383 characters.
     set(str(std::string(20000, 'n')), vm.newInteger(1));
     EXPECT_EQ(raised(), "Unable to set registry value.  Error in RegSetValueEx() call.");
-    EXPECT_EQ(subKeyCount(path), 1u) << "no key was created for the null arguments";
-}
-
-TEST_F(Registry, BulkWriteReadsBackEqual) {
-    jobject table = vm.newHashtable();
-    vm.hashtablePut(table, str("s"), str("text"));
-    vm.hashtablePut(table, str("i"), vm.newInteger(-7));
-    vm.hashtablePut(table, str("b"), vm.newByteArray({9, 8}));
-    vm.hashtablePut(table, str(""), str("default"));
-    setAll(table);
-    EXPECT_EQ(raised(), "");
-    EXPECT_EQ(describe(getAll()), describe(table));
-    EXPECT_EQ(vm.byteArrayValue(get(str("b"))), (Bytes{9, 8}));
+    EXPECT_EQ(subKeys(path), 1) << "no key was created for the null arguments";
 }
 
 TEST_F(Registry, BulkWriteStopsAtTheFirstBadEntryKeepingEarlierOnes) {
@@ -450,7 +431,7 @@ TEST_F(Registry, FailedTableLookupsRaiseTheirFixedMessagesAfterCreatingTheKey) {
     }
 }
 
-TEST_F(Registry, ValueDeletes) {
+TEST_F(Registry, DeletesRemoveWhatTheyMayAndRefuseTheRest) {
     set(str("v"), str("x"));
     lib.call<void>(kDeleteValue, jclass{}, kCurrentUser, jpath, str("v"));
     EXPECT_EQ(raised(), "");
@@ -462,9 +443,7 @@ TEST_F(Registry, ValueDeletes) {
     EXPECT_EQ(raised(), "Unable to open registry key");
     lib.call<void>(kDeleteValue, jclass{}, kCurrentUser, jstring{}, str("v"));
     EXPECT_EQ(raised(), "Cannot work with null registry key");
-}
 
-TEST_F(Registry, KeyDeletesRefuseWhatTheyMustNotRemove) {
     deleteKey(str(""), true);
     EXPECT_EQ(raised(), "Invalid registry key");
     deleteKey(jstring{}, true);
@@ -474,6 +453,10 @@ TEST_F(Registry, KeyDeletesRefuseWhatTheyMustNotRemove) {
     EXPECT_EQ(raised(), "Unable to remove non-empty key");
     deleteKey(sub("missing"), true);
     EXPECT_EQ(raised(), "Unable to delete one or more recursive keys");
+    setRawValue(path + "\\empty");
+    deleteKey(sub("empty"), false);
+    EXPECT_EQ(raised(), "");
+    EXPECT_FALSE(keyExists(path + "\\empty"));
 
     set(str("v"), vm.newInteger(1));
     deleteKey(jpath, false);
@@ -484,22 +467,7 @@ TEST_F(Registry, KeyDeletesRefuseWhatTheyMustNotRemove) {
     EXPECT_FALSE(keyExists(path)) << "a key with values but no sub-keys goes with them";
 }
 
-TEST_F(Registry, KeyDeleteRemovesOnlyTheLastLevel) {
-    createKey(path + "\\one\\two\\three");
-    deleteKey(sub("one\\two\\three"), false);
-    EXPECT_EQ(raised(), "");
-    EXPECT_FALSE(keyExists(path + "\\one\\two\\three"));
-    EXPECT_TRUE(keyExists(path + "\\one\\two"));
-
-    createKey(path + "\\one\\two\\three\\four");
-    setRawValue(path + "\\one\\two\\three\\four", "v", REG_SZ, "x", 2);
-    deleteKey(sub("one\\two\\three"), true);
-    EXPECT_EQ(raised(), "");
-    EXPECT_FALSE(keyExists(path + "\\one\\two\\three"));
-    EXPECT_TRUE(keyExists(path + "\\one\\two"));
-}
-
-TEST_F(Registry, RecursiveDeleteRemovesADeepAndWideTree) {
+TEST_F(Registry, RecursiveDeleteRemovesTheLastLevelWithItsWholeTree) {
     // Four levels, three keys wide at each, values at every level.
     std::vector<std::string> level{path + "\\tree"};
     for (int depth = 0; depth < 4; ++depth) {
@@ -513,16 +481,19 @@ TEST_F(Registry, RecursiveDeleteRemovesADeepAndWideTree) {
         level = std::move(next);
     }
     for (const std::string& leaf : level) {
-        createKey(leaf);
+        setRawValue(leaf);
     }
     deleteKey(sub("tree"), false);
     EXPECT_EQ(raised(), "Unable to remove non-empty key");
     EXPECT_TRUE(keyExists(level.front()));
 
+    // Only the last level of the path goes, with all below it; the levels above stay.
+    deleteKey(sub("tree\\k1\\k2"), true);
+    EXPECT_EQ(raised(), "");
+    EXPECT_EQ(subKeys(path + "\\tree\\k1"), 2);
     deleteKey(sub("tree"), true);
     EXPECT_EQ(raised(), "");
-    EXPECT_FALSE(keyExists(path + "\\tree"));
-    EXPECT_EQ(subKeyCount(path), 0u);
+    EXPECT_EQ(subKeys(path), 0);
 }
 
 // Volume: many values in one call each way, and a large tree removed in one call.
@@ -548,8 +519,8 @@ TEST_F(Registry, LoadBulkWriteReadAndTreeDelete) {
     for (int a = 0; a < 10; ++a) {
         for (int b = 0; b < 10; ++b) {
             for (int c = 0; c < 10; ++c) {
-                createKey(path + "\\tree\\" + std::to_string(a) + "\\" + std::to_string(b) + "\\" +
-                          std::to_string(c));
+                setRawValue(path + "\\tree\\" + std::to_string(a) + "\\" + std::to_string(b) + "\\" +
+                            std::to_string(c));
             }
         }
     }
@@ -570,17 +541,9 @@ TEST_F(RegistryAcp932, DoubleByteTextIsStoredWhole) {
     set(vm.newString(u"\u540d\u524d"), vm.newString(kanji));
     EXPECT_EQ(raised(), "");
 
-    HKEY key;
-    ASSERT_EQ(RegOpenKeyExA(HKEY_CURRENT_USER, path.c_str(), 0, KEY_READ, &key), ERROR_SUCCESS);
-    char stored[64] = {};
-    DWORD size = sizeof stored;
-    DWORD type = 0;
-    const LONG result = RegQueryValueExW(key, L"\u540d\u524d", nullptr, &type, nullptr, nullptr);
-    EXPECT_EQ(result, ERROR_SUCCESS) << "the name is stored as the double-byte text";
-    ASSERT_EQ(RegEnumValueA(key, 0, stored, &size, nullptr, &type, nullptr, nullptr), ERROR_SUCCESS);
-    RegCloseKey(key);
-    const RawValue raw = rawValue(path, stored);
-    EXPECT_EQ(raw.data.size(), 9u) << "eight bytes of text and the NUL";
+    char name[16] = {};
+    ASSERT_EQ(WideCharToMultiByte(CP_ACP, 0, L"\u540d\u524d", -1, name, sizeof name, nullptr, nullptr), 5);
+    EXPECT_EQ(rawValue(path, name).data.size(), 9u) << "eight bytes of text and the NUL";
     EXPECT_EQ(vm.stringValue(get(vm.newString(u"\u540d\u524d"))), kanji);
     EXPECT_EQ(raised(), "");
 
