@@ -4,4 +4,5 @@
 #include "jnihost.h"
 
 void tourDesktop(jnihost::Vm& vm, jnihost::Library& lib);
+void tourVelzip(jnihost::Vm& vm, jnihost::Library& lib);
 void tourRegistry(jnihost::Vm& vm, jnihost::Library& lib);
