@@ -106,7 +106,8 @@ public:
     void failFindClass(const std::string& className);
     // Member lookups: GetMethodID/GetStaticMethodID/GetFieldID of that name on that class.
     void failMemberLookup(const std::string& className, const std::string& memberName);
-    // NewObject*/NewObjectArray/NewString*/NewByteArray of that class ("java/lang/String", "[B" ...).
+    // NewObject*/AllocObject/NewObjectArray/NewString*/NewByteArray of that class ("java/lang/String",
+    // "[B" ...); for NewObjectArray the array's class ("[Ljava/lang/String;"), not its element's.
     void failNewObject(const std::string& className);
     void clearFailures();
 
