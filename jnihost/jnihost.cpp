@@ -313,21 +313,37 @@ bool javaEquals(const VmState& s, const Obj* a, const Obj* b) {
         return false;
     return a->cls == s.cString ? a->chars == b->chars : a->cls == s.cInteger && a->intValue == b->intValue;
 }
-}  // namespace
 
-Obj* VmState::hashtableGet(Obj* table, Obj* key) const {
-    for (const auto& e : table->entries) {
-        if (javaEquals(*this, e.first, key))
-            return e.second;
+// Hashed as Java hashes the keys the library uses, so equal keys meet in one bucket and a
+// table of thousands of entries costs what it costs in a real JVM, not a scan per call.
+size_t javaHash(const VmState& s, const Obj* key) {
+    if (key->cls == s.cString)
+        return std::hash<std::u16string>()(key->chars);
+    if (key->cls == s.cInteger)
+        return static_cast<size_t>(key->intValue);
+    return std::hash<const Obj*>()(key);
+}
+
+std::pair<Obj*, Obj*>* findEntry(const VmState& s, Obj* table, Obj* key) {
+    auto [first, last] = table->entryIndex.equal_range(javaHash(s, key));
+    for (auto it = first; it != last; ++it) {
+        auto& entry = table->entries[it->second];
+        if (javaEquals(s, entry.first, key))
+            return &entry;
     }
     return nullptr;
 }
+}  // namespace
+
+Obj* VmState::hashtableGet(Obj* table, Obj* key) const {
+    const auto* entry = findEntry(*this, table, key);
+    return entry ? entry->second : nullptr;
+}
 
 Obj* VmState::hashtablePut(Obj* table, Obj* key, Obj* value) {
-    for (auto& e : table->entries) {
-        if (javaEquals(*this, e.first, key))
-            return std::exchange(e.second, value);
-    }
+    if (auto* entry = findEntry(*this, table, key))
+        return std::exchange(entry->second, value);
+    table->entryIndex.emplace(javaHash(*this, key), table->entries.size());
     table->entries.emplace_back(key, value);
     return nullptr;
 }

@@ -65,13 +65,14 @@ struct ClassRec {
 // One Java object; only the parts its class uses are filled.
 struct Obj {
     ClassRec* cls;
-    ClassRec* asClass = nullptr;                 // java/lang/Class: the class it stands for
-    std::u16string chars;                        // java/lang/String
-    std::vector<jbyte> bytes;                    // [B
-    std::vector<Obj*> elems;                     // object arrays; enumerator snapshot
-    std::vector<std::pair<Obj*, Obj*>> entries;  // java/util/Hashtable
-    size_t cursor = 0;                           // enumerator position
-    jint intValue = 0;                           // java/lang/Integer
+    ClassRec* asClass = nullptr;                         // java/lang/Class: the class it stands for
+    std::u16string chars;                                // java/lang/String
+    std::vector<jbyte> bytes;                            // [B
+    std::vector<Obj*> elems;                             // object arrays; enumerator snapshot
+    std::vector<std::pair<Obj*, Obj*>> entries;          // java/util/Hashtable, in insertion order
+    std::unordered_multimap<size_t, size_t> entryIndex;  // key hash -> position in entries
+    size_t cursor = 0;                                   // enumerator position
+    jint intValue = 0;                                   // java/lang/Integer
     std::map<const Member*, jvalue> fields;
     ValidatorFn validator;
 };
