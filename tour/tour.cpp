@@ -36,6 +36,7 @@ int main() {
     }
     printExports(static_cast<HMODULE>(lib.handle()));
     tourDesktop(vm, lib);
+    tourChoosers(vm, lib);
     tourVelzip(vm, lib);
     tourRegistry(vm, lib);
     const size_t broken = vm.violations().size();
