@@ -36,8 +36,8 @@ int main() {
     }
     printExports(static_cast<HMODULE>(lib.handle()));
     tourDesktop(vm, lib);
-    tourChoosers(vm, lib);
     tourVelzip(vm, lib);
+    tourChoosers(vm, lib);
     tourRegistry(vm, lib);
     const size_t broken = vm.violations().size();
     std::printf("\nJNI rules broken during the tour: %u\n", static_cast<unsigned>(broken));

@@ -4,6 +4,6 @@
 #include "jnihost.h"
 
 void tourDesktop(jnihost::Vm& vm, jnihost::Library& lib);
-void tourChoosers(jnihost::Vm& vm, jnihost::Library& lib);
 void tourVelzip(jnihost::Vm& vm, jnihost::Library& lib);
+void tourChoosers(jnihost::Vm& vm, jnihost::Library& lib);
 void tourRegistry(jnihost::Vm& vm, jnihost::Library& lib);
