@@ -4,24 +4,13 @@
 #include <windows.h>
 #include <shlobj.h>
 
+#include "bridge/shell_item_list.h"
 #include "bridge/text_conversion.h"
 #include "com_velmor_coreutil_corenative_CoreNativeNT.h"
 
 namespace {
 
 const char kPointClass[] = "java/awt/Point";
-
-// Owns a shell item list; the shell's allocator frees it.
-struct ItemListDeleter {
-    void operator()(ITEMIDLIST* list) const {
-        IMalloc* allocator = nullptr;
-        if (SUCCEEDED(SHGetMalloc(&allocator))) {
-            allocator->Free(list);
-            allocator->Release();
-        }
-    }
-};
-using ItemList = std::unique_ptr<ITEMIDLIST, ItemListDeleter>;
 
 }  // namespace
 
@@ -45,7 +34,7 @@ jobject JNICALL Java_com_velmor_coreutil_corenative_CoreNativeNT_getCursorPos(JN
 }
 
 jboolean JNICALL Java_com_velmor_coreutil_corenative_CoreNativeNT_setCursorPos(JNIEnv* env, jclass,
-                                                                              jobject point) {
+                                                                               jobject point) {
     if (point == nullptr) {
         return JNI_FALSE;
     }
@@ -68,7 +57,7 @@ jboolean JNICALL Java_com_velmor_coreutil_corenative_CoreNativeNT_setCursorPos(J
 }
 
 jstring JNICALL Java_com_velmor_coreutil_corenative_CoreNativeNT_getEnvVariable(JNIEnv* env, jclass,
-                                                                               jstring name) {
+                                                                                jstring name) {
     if (name == nullptr) {
         return nullptr;
     }
@@ -91,7 +80,7 @@ jstring JNICALL Java_com_velmor_coreutil_corenative_CoreNativeNT_getEnvVariable(
 }
 
 jstring JNICALL Java_com_velmor_coreutil_corenative_CoreNativeNT_getSpecialFolderLocation(JNIEnv* env, jclass,
-                                                                                         jint folderId) {
+                                                                                          jint folderId) {
     char path[MAX_PATH] = {};
     BOOL found = FALSE;
     {

@@ -4,6 +4,7 @@
 
 #include <memory>
 
+#include "bridge/shell_item_list.h"
 #include "bridge/text_conversion.h"
 #include "choosers/chooser_window.h"
 #include "com_velmor_coreutil_hack_HackWindowsDirectoryChooser.h"
@@ -14,19 +15,6 @@ static_assert(sizeof(BROWSEINFOA) == 32, "BROWSEINFOA of 32-bit Windows");
 
 const char kValidatorInterface[] = "com/velmor/coreutil/hack/HackWindowsDirectoryValidator";
 const char kValidatorSignature[] = "Lcom/velmor/coreutil/hack/HackWindowsDirectoryValidator;";
-
-// Owns the item list the dialog returns; the shell's allocator frees it. When the
-// allocator cannot be had, the list is left alone rather than freed by the wrong heap.
-struct ItemListDeleter {
-    void operator()(ITEMIDLIST* list) const {
-        IMalloc* allocator = nullptr;
-        if (SUCCEEDED(SHGetMalloc(&allocator))) {
-            allocator->Free(list);
-            allocator->Release();
-        }
-    }
-};
-using ItemList = std::unique_ptr<ITEMIDLIST, ItemListDeleter>;
 
 // A handle in "hwnd" outlives its dialog, and Windows may give it to another window,
 // even one of another process; the status text goes only to a live window of ours.

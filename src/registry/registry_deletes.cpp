@@ -55,24 +55,11 @@ extern "C" {
 void JNICALL Java_com_velmor_coreutil_io_WinRegistry_nativeDeleteRegistryValue(JNIEnv* env, jclass,
                                                                                jint rootKey, jstring keyPath,
                                                                                jstring valueName) {
-    if (keyPath == nullptr) {
-        raiseCoreUtilException(env, "Cannot work with null registry key");
+    RegistryKey key;
+    if (!openRegistryKey(env, rootKey, keyPath, KEY_WRITE, &key)) {
         return;
     }
-    HKEY opened = nullptr;
     LONG result;
-    {
-        NativeText path;
-        if (!toNativeTextOrRaise(env, keyPath, &path)) {
-            return;
-        }
-        result = RegOpenKeyExA(rootKeyOf(rootKey), path.get(), 0, KEY_WRITE, &opened);
-    }
-    if (result != ERROR_SUCCESS) {
-        raiseCoreUtilException(env, "Unable to open registry key");
-        return;
-    }
-    RegistryKey key(opened);
     {
         NativeText name;
         if (valueName != nullptr && !toNativeTextOrRaise(env, valueName, &name)) {

@@ -2,32 +2,7 @@
 #include "com_velmor_coreutil_io_WinRegistry.h"
 #include "registry/registry_values.h"
 
-namespace {
-
-// Opens rootKey\keyPath for reading; raises and returns false when it cannot.
-bool openKeyForReading(JNIEnv* env, jint rootKey, jstring keyPath, RegistryKey* key) {
-    if (keyPath == nullptr) {
-        raiseCoreUtilException(env, "Cannot work with null registry key");
-        return false;
-    }
-    HKEY opened = nullptr;
-    LONG result;
-    {
-        NativeText path;
-        if (!toNativeTextOrRaise(env, keyPath, &path)) {
-            return false;
-        }
-        result = RegOpenKeyExA(rootKeyOf(rootKey), path.get(), 0, KEY_READ, &opened);
-    }
-    if (result != ERROR_SUCCESS) {
-        raiseCoreUtilException(env, "Unable to open registry key");
-        return false;
-    }
-    key->reset(opened);
-    return true;
-}
-
-}  // namespace
+namespace {}  // namespace
 
 extern "C" {
 
@@ -35,7 +10,7 @@ jobject JNICALL Java_com_velmor_coreutil_io_WinRegistry_nativeGetRegistryValue(J
                                                                                jint rootKey, jstring keyPath,
                                                                                jstring valueName) {
     RegistryKey key;
-    if (!openKeyForReading(env, rootKey, keyPath, &key)) {
+    if (!openRegistryKey(env, rootKey, keyPath, KEY_READ, &key)) {
         return nullptr;
     }
     jobject value;
@@ -56,7 +31,7 @@ jobject JNICALL Java_com_velmor_coreutil_io_WinRegistry_nativeGetRegistryValues(
                                                                                 jint rootKey,
                                                                                 jstring keyPath) {
     RegistryKey key;
-    if (!openKeyForReading(env, rootKey, keyPath, &key)) {
+    if (!openRegistryKey(env, rootKey, keyPath, KEY_READ, &key)) {
         return nullptr;
     }
     jclass tableClass = env->FindClass("java/util/Hashtable");

@@ -65,6 +65,28 @@ bool toNativeTextOrRaise(JNIEnv* env, jstring text, NativeText* result) {
     return false;
 }
 
+bool openRegistryKey(JNIEnv* env, jint rootKey, jstring keyPath, REGSAM access, RegistryKey* key) {
+    if (keyPath == nullptr) {
+        raiseCoreUtilException(env, "Cannot work with null registry key");
+        return false;
+    }
+    HKEY opened = nullptr;
+    LONG result;
+    {
+        NativeText path;
+        if (!toNativeTextOrRaise(env, keyPath, &path)) {
+            return false;
+        }
+        result = RegOpenKeyExA(rootKeyOf(rootKey), path.get(), 0, access, &opened);
+    }
+    if (result != ERROR_SUCCESS) {
+        raiseCoreUtilException(env, "Unable to open registry key");
+        return false;
+    }
+    key->reset(opened);
+    return true;
+}
+
 DWORD registryTypeOf(JNIEnv* env, jobject object) {
     // Each lookup is tested as it is made: after a failed one, no further JNI call may come.
     jclass stringClass = env->FindClass(kStringClass);

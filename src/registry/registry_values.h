@@ -52,6 +52,11 @@ DWORD registryTypeOf(JNIEnv* env, jobject object);
 // ERROR_NOT_ENOUGH_MEMORY with an exception already pending.
 LONG createRegistryKey(JNIEnv* env, jint rootKey, jstring keyPath, RegistryKey* key);
 
+// Opens rootKey\keyPath with the given access for a read or a delete. A null path raises
+// "Cannot work with null registry key", a failed open "Unable to open registry key"; the
+// path text is freed before either. False with the exception pending.
+bool openRegistryKey(JNIEnv* env, jint rootKey, jstring keyPath, REGSAM access, RegistryKey* key);
+
 // Stores a non-null object under the name (null: the default value). Returns the result of
 // RegSetValueExA, or ERROR_SUCCESS with an exception pending when the object cannot be
 // stored or a conversion failed, so callers test for a pending exception too.

@@ -92,6 +92,24 @@ void writeTableEntries(JNIEnv* env, HKEY key, jobject table, const TableWalk& wa
     }
 }
 
+// What both writes check and open before any value is written: the value or table first,
+// then the path, both before any key is created. False with a CoreUtilException pending.
+bool createKeyForWrite(JNIEnv* env, jint rootKey, jstring keyPath, jobject value, RegistryKey* key) {
+    if (value == nullptr) {
+        raiseCoreUtilException(env, "Cannot set registry value to null object");
+        return false;
+    }
+    if (keyPath == nullptr) {
+        raiseCoreUtilException(env, "Cannot work with null key");
+        return false;
+    }
+    if (createRegistryKey(env, rootKey, keyPath, key) != ERROR_SUCCESS) {
+        raiseUnlessPending(env, "Unable to create/open registry key");
+        return false;
+    }
+    return true;
+}
+
 }  // namespace
 
 extern "C" {
@@ -100,17 +118,8 @@ void JNICALL Java_com_velmor_coreutil_io_WinRegistry_nativeSetRegistryValue(JNIE
                                                                             jstring keyPath,
                                                                             jstring valueName,
                                                                             jobject value) {
-    if (value == nullptr) {
-        raiseCoreUtilException(env, "Cannot set registry value to null object");
-        return;
-    }
-    if (keyPath == nullptr) {
-        raiseCoreUtilException(env, "Cannot work with null key");
-        return;
-    }
     RegistryKey key;
-    if (createRegistryKey(env, rootKey, keyPath, &key) != ERROR_SUCCESS) {
-        raiseUnlessPending(env, "Unable to create/open registry key");
+    if (!createKeyForWrite(env, rootKey, keyPath, value, &key)) {
         return;
     }
     // An object that cannot be stored comes back as ERROR_SUCCESS with its exception pending,
@@ -123,18 +132,8 @@ void JNICALL Java_com_velmor_coreutil_io_WinRegistry_nativeSetRegistryValue(JNIE
 void JNICALL Java_com_velmor_coreutil_io_WinRegistry_nativeSetRegistryValues(JNIEnv* env, jclass,
                                                                              jint rootKey, jstring keyPath,
                                                                              jobject values) {
-    // Both tested before any key is created, the table first as for a single value.
-    if (values == nullptr) {
-        raiseCoreUtilException(env, "Cannot set registry value to null object");
-        return;
-    }
-    if (keyPath == nullptr) {
-        raiseCoreUtilException(env, "Cannot work with null key");
-        return;
-    }
     RegistryKey key;
-    if (createRegistryKey(env, rootKey, keyPath, &key) != ERROR_SUCCESS) {
-        raiseUnlessPending(env, "Unable to create/open registry key");
+    if (!createKeyForWrite(env, rootKey, keyPath, values, &key)) {
         return;
     }
     TableWalk walk{};

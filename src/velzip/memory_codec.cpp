@@ -2,6 +2,7 @@
 // questions about a Velzip header, of the open file or held in a Java array.
 #include <cstdint>
 #include <cstring>
+#include <memory>
 #include <new>
 
 #include "com_velmor_coreutil_toolkit_VelzipFile.h"
@@ -34,15 +35,16 @@ jint runCodec(JNIEnv* env, Codec codec, jbyteArray dst, jint dstSize, jbyteArray
         return 0;
     }
     unsigned int n = 0;
-    unsigned char* out = nullptr;
-    if (ensureCompressor() && (out = new (std::nothrow) unsigned char[dstSize]) != nullptr) {
-        const auto* in = reinterpret_cast<const unsigned char*>(source);
-        n = codec == Codec::Compress
-                ? compressor->Compress(out, static_cast<unsigned>(dstSize), in, srcSize)
-                : compressor->UnCompress(out, static_cast<unsigned>(dstSize), in, srcSize);
-        const jsize copy = n <= static_cast<unsigned>(dstSize) ? static_cast<jsize>(n) : dstSize;
-        env->SetByteArrayRegion(dst, 0, copy, reinterpret_cast<const jbyte*>(out));
-        delete[] out;
+    if (ensureCompressor()) {
+        std::unique_ptr<unsigned char[]> out(new (std::nothrow) unsigned char[dstSize]);
+        if (out) {
+            const auto* in = reinterpret_cast<const unsigned char*>(source);
+            n = codec == Codec::Compress
+                    ? compressor->Compress(out.get(), static_cast<unsigned>(dstSize), in, srcSize)
+                    : compressor->UnCompress(out.get(), static_cast<unsigned>(dstSize), in, srcSize);
+            const jsize copy = n <= static_cast<unsigned>(dstSize) ? static_cast<jsize>(n) : dstSize;
+            env->SetByteArrayRegion(dst, 0, copy, reinterpret_cast<const jbyte*>(out.get()));
+        }
     }
     env->ReleaseByteArrayElements(src, source, 0);
     return static_cast<jint>(n);

@@ -1,6 +1,7 @@
 // VelzipFile: lines and blocks to the file open for writing, from the file open for reading.
 // Bytes pass to and from the streams unchanged; text crosses as modified UTF-8.
 #include <cstring>
+#include <memory>
 #include <new>
 
 #include "com_velmor_coreutil_toolkit_VelzipFile.h"
@@ -77,16 +78,17 @@ jint JNICALL Java_com_velmor_coreutil_toolkit_VelzipFile_readDataN(JNIEnv* env, 
     if (!blockArgumentsFit(env, buffer, length)) {
         return 0;
     }
-    // new[] of at least one byte, so a zero length still gives a buffer to hand over.
-    unsigned char* native = new (std::nothrow) unsigned char[length > 0 ? length : 1];
-    if (native == nullptr) {
+    // At least one byte, so a zero length still gives a buffer to hand over.
+    std::unique_ptr<unsigned char[]> native(new (std::nothrow) unsigned char[length > 0 ? length : 1]);
+    if (!native) {
         return 0;
     }
-    const int n = inputStream->read(native, static_cast<unsigned>(length));
+    const int n = inputStream->read(native.get(), static_cast<unsigned>(length));
     if (n > 0) {  // a negative count copies nothing
-        env->SetByteArrayRegion(buffer, 0, n < length ? n : length, reinterpret_cast<const jbyte*>(native));
+        env->SetByteArrayRegion(buffer, 0, n < length ? n : length,
+                                reinterpret_cast<const jbyte*>(native.get()));
     }
-    delete[] native;
+    native.reset();
     const int error = inputStream->geterror();
     if (error != 0) {
         recordFailure(kReadFailed, velform("Error: %d reading encoded input file.", error));
