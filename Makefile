@@ -5,6 +5,7 @@ BUILD := build
 export TESSEL_BUILD := $(abspath $(BUILD))
 CMAKE_FLAGS := -DCMAKE_TOOLCHAIN_FILE=cmake/toolchain-i686-mingw.cmake -DCMAKE_BUILD_TYPE=Release
 JOBS := $(shell nproc 2>/dev/null || echo 2)
+MAKEFLAGS += --no-print-directory
 
 .PHONY: all setup configure build tour test bench format clean
 
