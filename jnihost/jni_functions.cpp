@@ -70,27 +70,27 @@ public:
     }
 
     // The object behind a handle that JNI requires to be non-null.
-    Obj* obj(const void* h, const std::string& role) {
+    Obj* obj(const void* h, const char* role) {
         if (!h)
-            return fail("null " + role);
+            return fail(std::string("null ") + role);
         Obj* o = vm_->resolve(h);
-        return o ? o : fail(role + " " + hex(h) + " is not a live object of this Vm");
+        return o ? o : fail(std::string(role) + " " + hex(h) + " is not a live object of this Vm");
     }
     // Null allowed; false only for a bad handle.
-    bool optObj(const void* h, const std::string& role, Obj*& out) {
+    bool optObj(const void* h, const char* role, Obj*& out) {
         out = h ? obj(h, role) : nullptr;
         return !h || out;
     }
-    Obj* instance(const void* h, const ClassRec* want, const std::string& role) {
+    Obj* instance(const void* h, const ClassRec* want, const char* role) {
         Obj* o = obj(h, role);
         if (o && !vm_->isA(o->cls, want))
-            return fail(role + " is " + vm_->describe(o) + ", not a " + want->name);
+            return fail(std::string(role) + " is " + vm_->describe(o) + ", not a " + want->name);
         return o;
     }
-    ClassRec* cls(const void* h, const std::string& role = "class") {
+    ClassRec* cls(const void* h, const char* role = "class") {
         Obj* o = obj(h, role);
         if (o && !o->asClass)
-            return fail(role + " is " + vm_->describe(o) + ", not a class");
+            return fail(std::string(role) + " is " + vm_->describe(o) + ", not a class");
         return o ? o->asClass : nullptr;
     }
     Obj* array(const void* h, bool ofObjects) {
@@ -137,13 +137,16 @@ public:
                 v.i = va_arg(*ap, int);  // Z, B, C, S, I arrive promoted; the union reads them back
             }
             if (kindOf(type) == 'L') {
-                const std::string role = "argument " + std::to_string(out.size() + 1) + " of " + m->name;
+                // The description is built only for a report: this runs for every argument.
+                auto role = [&] { return "argument " + std::to_string(out.size() + 1) + " of " + m->name; };
                 const ClassRec* want = vm_->classOfType(type);
-                Obj* o;
-                if (!optObj(v.l, role, o))
+                Obj* o = v.l ? vm_->resolve(v.l) : nullptr;
+                if (v.l && !o) {
+                    fail(role() + " " + hex(v.l) + " is not a live object of this Vm");
                     return false;
+                }
                 if (o && want && !vm_->isA(o->cls, want)) {
-                    fail(role + " is " + vm_->describe(o) + ", not a " + want->name);
+                    fail(role() + " is " + vm_->describe(o) + ", not a " + want->name);
                     return false;
                 }
             }
