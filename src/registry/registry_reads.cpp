@@ -2,8 +2,6 @@
 #include "com_velmor_coreutil_io_WinRegistry.h"
 #include "registry/registry_values.h"
 
-namespace {}  // namespace
-
 extern "C" {
 
 jobject JNICALL Java_com_velmor_coreutil_io_WinRegistry_nativeGetRegistryValue(JNIEnv* env, jclass,

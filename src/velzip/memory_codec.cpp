@@ -50,6 +50,16 @@ jint runCodec(JNIEnv* env, Codec codec, jbyteArray dst, jint dstSize, jbyteArray
     return static_cast<jint>(n);
 }
 
+// The queries about the open file: with none open, id 9 is recorded; then the compressor is
+// made, as for every query but isVelmorEncryptedN.
+bool openFileQueryReady() {
+    if (fid < 0) {
+        recordFailure(kNoInputStream, kMsgNoInputStream);
+        return false;
+    }
+    return ensureCompressor();
+}
+
 // The byte-array header queries: a null array or one shorter than a header gives 0 without
 // reading it; nothing is recorded either way.
 template <class Query>
@@ -88,11 +98,7 @@ jint JNICALL Java_com_velmor_coreutil_toolkit_VelzipFile_decodeMemN(JNIEnv* env,
 }
 
 jboolean JNICALL Java_com_velmor_coreutil_toolkit_VelzipFile_isVelmorZipN(JNIEnv*, jclass) {
-    if (fid < 0) {
-        recordFailure(kNoInputStream, kMsgNoInputStream);
-        return JNI_FALSE;
-    }
-    if (!ensureCompressor()) {
+    if (!openFileQueryReady()) {
         return JNI_FALSE;
     }
     return Zel_Compress::IsVelmorZipFormat(Zel::FileDesc(fid), 1) == 1 ? JNI_TRUE : JNI_FALSE;
@@ -108,11 +114,7 @@ jboolean JNICALL Java_com_velmor_coreutil_toolkit_VelzipFile_isVelmorEncryptedN(
 }
 
 jint JNICALL Java_com_velmor_coreutil_toolkit_VelzipFile_getNumCompressedBytesN__(JNIEnv*, jclass) {
-    if (fid < 0) {
-        recordFailure(kNoInputStream, kMsgNoInputStream);
-        return 0;
-    }
-    if (!ensureCompressor()) {
+    if (!openFileQueryReady()) {
         return 0;
     }
     return static_cast<jint>(Zel_Compress::GetNumCompressedBytes(Zel::FileDesc(fid)));
@@ -125,11 +127,7 @@ jint JNICALL Java_com_velmor_coreutil_toolkit_VelzipFile_getNumCompressedBytesN_
 }
 
 jint JNICALL Java_com_velmor_coreutil_toolkit_VelzipFile_getNumUncompressedBytesN__(JNIEnv*, jclass) {
-    if (fid < 0) {
-        recordFailure(kNoInputStream, kMsgNoInputStream);
-        return 0;
-    }
-    if (!ensureCompressor()) {
+    if (!openFileQueryReady()) {
         return 0;
     }
     return static_cast<jint>(Zel_Compress::GetNumUnCompressedBytes(Zel::FileDesc(fid)));

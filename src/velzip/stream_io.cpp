@@ -23,6 +23,10 @@ bool blockArgumentsFit(JNIEnv* env, jbyteArray array, jint length) {
     return true;
 }
 
+void recordReadFailure(int error) {
+    recordFailure(kReadFailed, velform("Error: %d reading encoded input file.", error));
+}
+
 }  // namespace
 
 extern "C" {
@@ -91,7 +95,7 @@ jint JNICALL Java_com_velmor_coreutil_toolkit_VelzipFile_readDataN(JNIEnv* env, 
     native.reset();
     const int error = inputStream->geterror();
     if (error != 0) {
-        recordFailure(kReadFailed, velform("Error: %d reading encoded input file.", error));
+        recordReadFailure(error);
         return 0;
     }
     return n;
@@ -115,7 +119,7 @@ jstring JNICALL Java_com_velmor_coreutil_toolkit_VelzipFile_readLineN(JNIEnv* en
     jstring line = env->NewStringUTF(reinterpret_cast<const char*>(buffer));
     const int error = inputStream->geterror();
     if (error != 0) {
-        recordFailure(kReadFailed, velform("Error: %d reading encoded input file.", error));
+        recordReadFailure(error);
         return nullptr;  // the new string is dropped; its local reference ends with the call
     }
     return line;
