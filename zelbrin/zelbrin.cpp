@@ -60,14 +60,29 @@ std::string logCopy;
 int compressorsCreated = 0;
 int failWritesWith = 0;
 
-void note(const std::string& entry) {
+// The log only serves tests: a failure to grow it is dropped rather than thrown across the
+// DLL boundary, where an exception cannot pass.
+void note(const char* entry) noexcept {
     std::lock_guard<std::mutex> lock(logMutex);
     if (logging) {
-        if (!logText.empty()) {
-            logText += ' ';
+        try {
+            if (!logText.empty()) {
+                logText += ' ';
+            }
+            logText += entry;
+        } catch (const std::bad_alloc&) {
         }
-        logText += entry;
     }
+}
+
+// A log entry with numbers in it, formatted without the heap.
+void notef(const char* format, ...) noexcept {
+    char entry[96];
+    va_list args;
+    va_start(args, format);
+    std::vsnprintf(entry, sizeof entry, format, args);
+    va_end(args);
+    note(entry);
 }
 
 // ---- Paths: (modified) UTF-8 to the platform's form ----
@@ -133,10 +148,15 @@ bool decodeUtf8(const char* text, std::u16string& out) {
 struct NativePath {
     std::wstring text;
     bool ok = false;
-    explicit NativePath(const char* path) {
-        std::u16string units;
-        ok = decodeUtf8(path, units);
-        text.assign(units.begin(), units.end());
+    // A path too long to copy counts as one that cannot be decoded: no exception leaves the DLL.
+    explicit NativePath(const char* path) noexcept {
+        try {
+            std::u16string units;
+            ok = decodeUtf8(path, units);
+            text.assign(units.begin(), units.end());
+        } catch (const std::bad_alloc&) {
+            ok = false;
+        }
     }
     const wchar_t* c_str() const { return text.c_str(); }
 };
@@ -702,7 +722,7 @@ bool File::canwrite(const char* path) {
 }
 
 Stream* File::open(const char* path, Stream::Access access, bool lines) {
-    note("open(" + std::to_string(static_cast<int>(access)) + "," + std::to_string(lines ? 1 : 0) + ")");
+    notef("open(%d,%d)", static_cast<int>(access), lines ? 1 : 0);
     const NativePath p(path);
     if (!Registry::get().ready() || !p.ok || (access != Stream::Read && access != Stream::Write)) {
         return nullptr;
@@ -749,7 +769,12 @@ Stream* File::open(const char* path, Stream::Access access, bool lines) {
         delete impl;
         return nullptr;
     }
-    impl->fid = Registry::get().add(stream);
+    try {
+        impl->fid = Registry::get().add(stream);
+    } catch (const std::bad_alloc&) {
+        delete stream;  // closes the file it opened
+        return nullptr;
+    }
     return stream;
 }
 
@@ -769,7 +794,7 @@ bool File::close(Stream* stream) {
 }
 
 FileDesc::FileDesc(int fid) : fid_(fid) {
-    note("FileDesc(" + std::to_string(fid) + ")");
+    notef("FileDesc(%d)", static_cast<int>(fid));
 }
 
 FileInit::FileInit() {
@@ -809,13 +834,13 @@ Zel_Compress::Zel_Compress() : format_(3), level_(6), deflate_(1), encrypt_(0) {
 }
 
 void Zel_Compress::SetVersion(unsigned int format, unsigned int level) {
-    note("SetVersion(" + std::to_string(format) + "," + std::to_string(level) + ")");
+    notef("SetVersion(%u,%u)", static_cast<unsigned>(format), static_cast<unsigned>(level));
     format_ = format;
     level_ = level;
 }
 
 void Zel_Compress::SetCompressFlags(unsigned char deflate, unsigned char encrypt) {
-    note("SetCompressFlags(" + std::to_string(deflate) + "," + std::to_string(encrypt) + ")");
+    notef("SetCompressFlags(%u,%u)", static_cast<unsigned>(deflate), static_cast<unsigned>(encrypt));
     deflate_ = deflate;
     encrypt_ = encrypt;
 }
@@ -873,7 +898,7 @@ unsigned int Zel_Compress::UnCompress(unsigned char* dst, unsigned int dstSize, 
 }
 
 unsigned char Zel_Compress::IsVelmorZipFormat(Zel::FileDesc file, unsigned char deep) {
-    note("IsVelmorZipFormat(" + std::to_string(deep) + ")");
+    notef("IsVelmorZipFormat(%u)", static_cast<unsigned>(deep));
     const Zel::Stream::Impl* s = Zel::Registry::get().find(file.fid());
     if (s == nullptr) {
         return 0;
@@ -931,8 +956,9 @@ unsigned int finishSize(uint64_t n, unsigned char align16) {
 
 unsigned int Zel_Compress::GetSizeofCompressedBuffer(unsigned int size, unsigned char withHeader,
                                                      unsigned char worstCase, unsigned char align16) {
-    note("GetSizeofCompressedBuffer(" + std::to_string(size) + "," + std::to_string(withHeader) + "," +
-         std::to_string(worstCase) + "," + std::to_string(align16) + ")");
+    notef("GetSizeofCompressedBuffer(%u,%u,%u,%u)", static_cast<unsigned>(size),
+          static_cast<unsigned>(withHeader), static_cast<unsigned>(worstCase),
+          static_cast<unsigned>(align16));
     uint64_t n = size;
     if (worstCase) {
         n += (n >> 12) + (n >> 14) + (n >> 25) + 13;  // zlib's compressBound, without overflow
@@ -945,8 +971,8 @@ unsigned int Zel_Compress::GetSizeofCompressedBuffer(unsigned int size, unsigned
 
 unsigned int Zel_Compress::GetSizeofUnCompressedBuffer(const unsigned char* header, unsigned char validate,
                                                        unsigned char terminator, unsigned char align16) {
-    note("GetSizeofUnCompressedBuffer(" + std::to_string(validate) + "," + std::to_string(terminator) + "," +
-         std::to_string(align16) + ")");
+    notef("GetSizeofUnCompressedBuffer(%u,%u,%u)", static_cast<unsigned>(validate),
+          static_cast<unsigned>(terminator), static_cast<unsigned>(align16));
     if (header == nullptr || (validate && !magicMatches(header))) {
         return 0;
     }
