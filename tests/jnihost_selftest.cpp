@@ -4,6 +4,7 @@
 
 #include <climits>
 #include <string>
+#include <thread>
 
 #include "jnihost.h"
 #include "violation_log.h"
@@ -127,6 +128,22 @@ TEST_F(Host, ExportCallsReportWrongStackSizeMissingExportsAndLeakedBlocks) {
     program.call<void>("leakUtfChars@12", jclass{}, vm.newString(u"kept"));
     EXPECT_TRUE(
         log.reported("leakUtfChars@12: GetStringUTFChars of java/lang/String \"kept\" never released"));
+}
+
+TEST_F(Host, MisusedEnvsAndObjectsAreReported) {
+    // The choosers' dialogs call back on one thread while Java calls in from another: each
+    // thread must use its own env.
+    std::thread([&] { env->FindClass("java/lang/String"); }).join();
+    EXPECT_TRUE(log.reported("used on thread"));
+
+    env->GetStringLength(nullptr);
+    EXPECT_TRUE(log.reported("GetStringLength: null"));
+    env->GetStringChars(reinterpret_cast<jstring>(vm.newByteArray({1, 2})), nullptr);
+    EXPECT_TRUE(log.reported("GetStringChars"));
+    jclass chooser = env->FindClass(jnihost::kFileChooserClass);
+    jfieldID hwnd = env->GetFieldID(chooser, "hwnd", "J");
+    env->GetIntField(vm.newInstance(jnihost::kFileChooserClass), hwnd);
+    EXPECT_TRUE(log.reported("GetIntField"));
 }
 
 }  // namespace
