@@ -59,6 +59,7 @@ std::string logText;
 std::string logCopy;
 int compressorsCreated = 0;
 int failWritesWith = 0;
+int failReadsWith = 0;
 
 // The log only serves tests: a failure to grow it is dropped rather than thrown across the
 // DLL boundary, where an exception cannot pass.
@@ -643,8 +644,10 @@ int Stream::read(unsigned char* buffer, unsigned int count) {
         s.broken = s.error = s.deferred;
         return -1;
     }
-    s.error = 0;
-    return static_cast<int>(placed);
+    // A read error injected by a test arrives after the bytes, as a disk error can: the
+    // count delivered stands and geterror reports the number.
+    s.error = failReadsWith;
+    return placed == 0 && failReadsWith != 0 ? -1 : static_cast<int>(placed);
 }
 
 void Stream::write(const unsigned char* data, unsigned int count) {
@@ -1043,6 +1046,10 @@ int ZelTest_CompressorsCreated(void) {
 
 void ZelTest_FailWrites(int errorNumber) {
     failWritesWith = errorNumber;
+}
+
+void ZelTest_FailReads(int errorNumber) {
+    failReadsWith = errorNumber;
 }
 
 }  // extern "C"

@@ -210,4 +210,7 @@ ZELBRIN_API int ZelTest_LiveFileInits(void);
 ZELBRIN_API int ZelTest_CompressorsCreated(void);
 // From now on, every write on an output stream fails with this error number (0: stop).
 ZELBRIN_API void ZelTest_FailWrites(int errorNumber);
+// From now on, every read on an input stream records this error number (0: stop) after
+// delivering what it read: the count stands, and geterror then reports the number.
+ZELBRIN_API void ZelTest_FailReads(int errorNumber);
 }
