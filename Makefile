@@ -7,7 +7,11 @@ CMAKE_FLAGS := -DCMAKE_TOOLCHAIN_FILE=cmake/toolchain-i686-mingw.cmake -DCMAKE_B
 JOBS := $(shell nproc 2>/dev/null || echo 2)
 MAKEFLAGS += --no-print-directory
 
-.PHONY: all setup configure build tour test bench format clean
+# `make fuzz SECONDS=N`: the fuzz driver of the exports for N seconds with a fresh seed, then
+# the native fuzz target of the stand-in's container reader when scripts/fuzz-native exists.
+SECONDS := 120
+
+.PHONY: all setup configure build tour test bench fuzz soak format clean
 
 all: tour
 
@@ -28,6 +32,14 @@ test: build
 
 bench: build
 	@scripts/testbed scripts/bench
+
+fuzz: build
+	@status=0; scripts/testbed scripts/fuzz-exports --seconds $(SECONDS) || status=1; \
+	if [ -x scripts/fuzz-native ]; then scripts/fuzz-native $(SECONDS) || status=1; fi; \
+	exit $$status
+
+soak: build
+	@scripts/testbed scripts/soak
 
 format:
 	@clang-format -i $$(git ls-files '*.cpp' '*.h')

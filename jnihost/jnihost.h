@@ -78,13 +78,17 @@ public:
 
     jobject newHashtable();
     void hashtablePut(jobject table, jobject key, jobject value);  // equals/hashCode as Java
-    jobject hashtableGet(jobject table, jobject key);              // null when absent
+    // A table that breaks Hashtable's contract (as a subclass overriding put could): the
+    // entry's value is null, and get gives null for its key.
+    void hashtablePutNullValue(jobject table, jobject key);
+    jobject hashtableGet(jobject table, jobject key);  // null when absent
     std::vector<std::pair<jobject, jobject>> hashtableEntries(jobject table);
 
     // A plain java/lang/Object (neither String, Integer nor byte[]).
     jobject newPlainObject();
 
-    // An instance of one of the application classes above, fields zero/null.
+    // An instance of one of the application classes above, or of java/lang/Long or
+    // java/lang/Double (no value: only their class matters to the library), fields zero/null.
     jobject newInstance(const char* className);
     jobject newValidator(ValidatorFn fn);
 
@@ -192,5 +196,9 @@ R Library::call(const char* exportName, A... args) {
 // UTF-8 <-> UTF-16 helpers for tests.
 std::u16string utf16(const std::string& utf8);
 std::string utf8(const std::u16string& text);
+// Modified UTF-8 as JNI uses it (U+0000 as C0 80, surrogates encoded one by one).
+std::string toModifiedUtf8(const std::u16string& s);
+// False when the bytes are not well-formed modified UTF-8; bad bytes then become U+FFFD.
+bool fromModifiedUtf8(const char* s, std::u16string& out);
 
 }  // namespace jnihost

@@ -177,10 +177,6 @@ inline jvalue jv(const Obj* o) {
     return v;
 }
 
-// Modified UTF-8 as JNI uses it (U+0000 as C0 80, surrogates encoded one by one).
-std::string toModifiedUtf8(const std::u16string& s);
-// False when the bytes are not well-formed modified UTF-8; bad bytes then become U+FFFD.
-bool fromModifiedUtf8(const char* s, std::u16string& out);
 std::string hex(const void* p);
 // Here so that the JNI function table need not include <windows.h>, whose names clash.
 unsigned long currentThreadId();

@@ -1,169 +1,26 @@
-// Support for the WinRegistry tests, which run against the real (Wine) registry.
-//
-// - ScopedTestKey: a key of one test's own below HKEY_CURRENT_USER\Software, removed with its
-//   whole tree when the test ends (HKCU persists in the Wine prefix, so a leftover would leak
-//   into the next run).
-// - Readers and writers that go straight to ADVAPI32, past the library: to check what the
-//   library really stored (type, exact bytes) and to plant data it could never write itself.
-// - RegistryTest: the JNI host fixture with the six WinRegistry exports bound to the test's
-//   key, and the pending CoreUtilException's message as a plain string.
+// Support for the WinRegistry tests, which run against the real (Wine) registry: the JNI
+// host fixture with the six WinRegistry exports bound to the test's own key (a
+// regkit::ScopedTestKey, see registry_kit.h), and the pending CoreUtilException's message as
+// a plain string.
 #pragma once
 
-#include <windows.h>
-
 #include <algorithm>
-#include <cstdint>
 #include <string>
 #include <utility>
 #include <vector>
 
 #include "host_fixture.h"
-
-namespace regkit {
-
-using Bytes = std::vector<uint8_t>;
-
-inline const jint kCurrentUser = static_cast<jint>(0x80000001);
-// A root handle value that is no predefined key: every open or create under it fails.
-inline const jint kNoSuchRoot = static_cast<jint>(0x12345678);
-
-// A value as Windows holds it. result is ERROR_FILE_NOT_FOUND when the key is missing.
-struct RawValue {
-    LONG result = ERROR_FILE_NOT_FOUND;
-    DWORD type = REG_NONE;
-    Bytes data;
-};
-
-inline RawValue rawValue(const std::string& path, const char* name) {
-    RawValue raw;
-    HKEY key;
-    if (RegOpenKeyExA(HKEY_CURRENT_USER, path.c_str(), 0, KEY_READ, &key) != ERROR_SUCCESS) {
-        return raw;
-    }
-    DWORD size = 0;
-    raw.result = RegQueryValueExA(key, name, nullptr, &raw.type, nullptr, &size);
-    if (raw.result == ERROR_SUCCESS) {
-        raw.data.resize(size);
-        raw.result = RegQueryValueExA(key, name, nullptr, &raw.type, raw.data.data(), &size);
-        raw.data.resize(raw.result == ERROR_SUCCESS ? size : 0);
-    }
-    RegCloseKey(key);
-    return raw;
-}
-
-// Creates the key with any missing keys above it and, given a name, sets that value to
-// exactly `size` bytes of `data` (which need not fit the type). False on any failure.
-inline bool setRawValue(const std::string& path, const char* name = nullptr, DWORD type = REG_NONE,
-                        const void* data = nullptr, DWORD size = 0) {
-    HKEY key;
-    if (RegCreateKeyExA(HKEY_CURRENT_USER, path.c_str(), 0, nullptr, 0, KEY_ALL_ACCESS, nullptr, &key,
-                        nullptr) != ERROR_SUCCESS) {
-        return false;
-    }
-    const bool ok = name == nullptr ||
-                    RegSetValueExA(key, name, 0, type, static_cast<const BYTE*>(data), size) == ERROR_SUCCESS;
-    RegCloseKey(key);
-    return ok;
-}
-
-// The number of sub-keys of a key; -1 when the key does not exist.
-inline int subKeys(const std::string& path) {
-    HKEY key;
-    DWORD count = 0;
-    if (RegOpenKeyExA(HKEY_CURRENT_USER, path.c_str(), 0, KEY_READ, &key) != ERROR_SUCCESS) {
-        return -1;
-    }
-    RegQueryInfoKeyA(key, nullptr, nullptr, nullptr, &count, nullptr, nullptr, nullptr, nullptr, nullptr,
-                     nullptr, nullptr);
-    RegCloseKey(key);
-    return static_cast<int>(count);
-}
-
-inline bool keyExists(const std::string& path) {
-    return subKeys(path) >= 0;
-}
-
-// The value names of a key in the order RegEnumValueA lists them (Wine: alphabetical).
-inline std::vector<std::string> valueNames(const std::string& path) {
-    std::vector<std::string> names;
-    HKEY key;
-    if (RegOpenKeyExA(HKEY_CURRENT_USER, path.c_str(), 0, KEY_READ, &key) != ERROR_SUCCESS) {
-        return names;
-    }
-    char name[16384];
-    for (DWORD i = 0;; ++i) {
-        DWORD capacity = sizeof name;
-        if (RegEnumValueA(key, i, name, &capacity, nullptr, nullptr, nullptr, nullptr) != ERROR_SUCCESS) {
-            break;
-        }
-        names.emplace_back(name, capacity);
-    }
-    RegCloseKey(key);
-    return names;
-}
-
-// A tree below `root`: `depth` levels of `width` keys each, named k0, k1, ...; with
-// `values`, every key above the leaves also holds a DWORD value "v". Returns the leaves.
-inline std::vector<std::string> makeTree(const std::string& root, int depth, int width, bool values) {
-    std::vector<std::string> level{root};
-    for (int d = 0; d < depth; ++d) {
-        std::vector<std::string> next;
-        for (const std::string& parent : level) {
-            if (values) {
-                setRawValue(parent, "v", REG_DWORD, "\1\0\0\0", 4);
-            }
-            for (int k = 0; k < width; ++k) {
-                next.push_back(parent + "\\k" + std::to_string(k));
-            }
-        }
-        level = std::move(next);
-    }
-    for (const std::string& leaf : level) {
-        setRawValue(leaf);
-    }
-    return level;
-}
-
-// HKCU\Software\TesselRegistryTests\<name>-<process id>, absent when made and removed with
-// its tree when destroyed; the common parent goes too once no other run's key is left. The
-// process id keeps apart the test programs that ctest runs side by side.
-class ScopedTestKey {
-public:
-    explicit ScopedTestKey(const std::string& name)
-        : path_(std::string(kRoot) + "\\" + name + "-" + std::to_string(GetCurrentProcessId())) {
-        RegDeleteTreeA(HKEY_CURRENT_USER, path_.c_str());  // left by a run that crashed
-    }
-    ~ScopedTestKey() {
-        RegDeleteTreeA(HKEY_CURRENT_USER, path_.c_str());
-        RegDeleteKeyA(HKEY_CURRENT_USER, kRoot);  // fails while another run's key is there
-    }
-    ScopedTestKey(const ScopedTestKey&) = delete;
-    ScopedTestKey& operator=(const ScopedTestKey&) = delete;
-
-    const std::string& path() const { return path_; }
-
-private:
-    static constexpr const char* kRoot = "Software\\TesselRegistryTests";
-    std::string path_;
-};
-
-}  // namespace regkit
+#include "registry_kit.h"
 
 // Each test works in its own ScopedTestKey (path, jpath) through the WinRegistry exports.
 class RegistryTest : public HostTest {
 protected:
-    static constexpr const char* kGetValue =
-        "_Java_com_velmor_coreutil_io_WinRegistry_nativeGetRegistryValue@20";
-    static constexpr const char* kGetValues =
-        "_Java_com_velmor_coreutil_io_WinRegistry_nativeGetRegistryValues@16";
-    static constexpr const char* kSetValue =
-        "_Java_com_velmor_coreutil_io_WinRegistry_nativeSetRegistryValue@24";
-    static constexpr const char* kSetValues =
-        "_Java_com_velmor_coreutil_io_WinRegistry_nativeSetRegistryValues@20";
-    static constexpr const char* kDeleteValue =
-        "_Java_com_velmor_coreutil_io_WinRegistry_nativeDeleteRegistryValue@20";
-    static constexpr const char* kDeleteKey =
-        "_Java_com_velmor_coreutil_io_WinRegistry_nativeDeleteRegistryKey@20";
+    static constexpr const char* kGetValue = regkit::kGetValue;
+    static constexpr const char* kGetValues = regkit::kGetValues;
+    static constexpr const char* kSetValue = regkit::kSetValue;
+    static constexpr const char* kSetValues = regkit::kSetValues;
+    static constexpr const char* kDeleteValue = regkit::kDeleteValue;
+    static constexpr const char* kDeleteKey = regkit::kDeleteKey;
 
     jstring str(const std::string& utf8) { return vm.newStringUtf8(utf8); }
     // A Java path to a key below the test's own key.
