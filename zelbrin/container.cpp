@@ -56,6 +56,18 @@ bool Stream::Impl::flushOut() {
     return true;
 }
 
+bool Stream::Impl::startInput(const unsigned char* header, long long size) {
+    if (!magicMatches(header) || inflateInit(&z) != Z_OK) {
+        return false;
+    }
+    std::memcpy(version, header + 4, 4);
+    version[4] = 0;
+    headerCompressed = le32(header + 8);
+    headerUncompressed = le32(header + 12);
+    fileSize = size;
+    return true;
+}
+
 int Stream::Impl::refill() {
     pendPos = pendLen = 0;
     if (std::strcmp(version, "00") != 0) {

@@ -121,6 +121,9 @@ struct Stream::Impl {
 
     ~Impl();
     bool flushOut();
+    // An input stream's start from the header read at open and the file's size: false when
+    // the header is not a Velzip header or zlib cannot start.
+    bool startInput(const unsigned char* header, long long size);
     // Decodes the next piece of the body into outBuf (used as the decoded buffer on input).
     // Returns 0, or the failure met; bytes decoded before a failure stay deliverable.
     int refill();

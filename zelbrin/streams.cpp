@@ -226,15 +226,10 @@ Stream* File::open(const char* path, Stream::Access access, bool lines) {
         impl->file = osOpenRead(p);
         unsigned char header[kHeaderBytes];
         if (impl->file == kNoFile || osReadFull(impl->file, header, kHeaderBytes) != kHeaderBytes ||
-            !magicMatches(header) || inflateInit(&impl->z) != Z_OK) {
+            !impl->startInput(header, osSize(impl->file))) {
             delete impl;
             return nullptr;
         }
-        std::memcpy(impl->version, header + 4, 4);
-        impl->version[4] = 0;
-        impl->headerCompressed = le32(header + 8);
-        impl->headerUncompressed = le32(header + 12);
-        impl->fileSize = osSize(impl->file);
     }
     impl->zReady = true;
     auto* stream = new (std::nothrow) Stream(impl);
