@@ -7,7 +7,7 @@ CMAKE_FLAGS := -DCMAKE_TOOLCHAIN_FILE=cmake/toolchain-i686-mingw.cmake -DCMAKE_B
 JOBS := $(shell nproc 2>/dev/null || echo 2)
 MAKEFLAGS += --no-print-directory
 
-.PHONY: all setup configure build tour test bench format clean
+.PHONY: all setup configure build tour test bench fuzz-native format clean
 
 all: tour
 
@@ -28,6 +28,12 @@ test: build
 
 bench: build
 	@scripts/testbed scripts/bench
+
+# The stand-in's container reader under libFuzzer, natively: `make fuzz-native SECONDS=300`,
+# with SEED=N to replay a run.
+SECONDS ?= 60
+fuzz-native: setup
+	@scripts/fuzz-native $(SECONDS) $(if $(SEED),--seed $(SEED))
 
 format:
 	@clang-format -i $$(git ls-files '*.cpp' '*.h')
