@@ -8,10 +8,10 @@ JOBS := $(shell nproc 2>/dev/null || echo 2)
 MAKEFLAGS += --no-print-directory
 
 # `make fuzz SECONDS=N`: the fuzz driver of the exports for N seconds with a fresh seed, then
-# the native fuzz target of the stand-in's container reader when scripts/fuzz-native exists.
-SECONDS := 120
+# the native fuzz target of the stand-in's container reader (scripts/fuzz-native), if present.
+SECONDS ?= 60
 
-.PHONY: all setup configure build tour test bench fuzz soak format clean
+.PHONY: all setup configure build tour test bench fuzz fuzz-native soak format clean
 
 all: tour
 
@@ -38,6 +38,12 @@ fuzz: build
 	if [ -x scripts/fuzz-native ]; then scripts/fuzz-native $(SECONDS) || status=1; fi; \
 	exit $$status
 
+# The stand-in's container reader under libFuzzer, natively: `make fuzz-native SECONDS=300`,
+# with SEED=N to replay a run.
+fuzz-native: setup
+	@scripts/fuzz-native $(SECONDS) $(if $(SEED),--seed $(SEED))
+
+# Long loops of every family and thread churn, with leak figures (not part of `make test`).
 soak: build
 	@scripts/testbed scripts/soak
 
