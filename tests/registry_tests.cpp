@@ -139,6 +139,13 @@ TEST_F(Registry, WritesCreateMissingKeysAndABadEntryEndsTheBulkWriteKeepingEarli
         table({{str("second"), str("two")}, {str("plain"), vm.newPlainObject()}, {str("later"), str("x")}}));
     EXPECT_EQ(raised(), kNoType);
     EXPECT_EQ(contents(getAll()), (Entries{{"first", "i:1"}, {"second", "s:two"}}));
+    // A table that breaks Hashtable's contract (an entry with a null value) ends the walk there.
+    jobject broken = table({{str("third"), vm.newInteger(3)}});
+    vm.hashtablePutNullValue(broken, str("empty"));
+    vm.hashtablePut(broken, str("never"), str("x"));
+    setAll(broken);
+    EXPECT_EQ(raised(), "Cannot set registry value to null object");
+    EXPECT_EQ(contents(getAll()), (Entries{{"first", "i:1"}, {"second", "s:two"}, {"third", "i:3"}}));
 }
 
 TEST_F(Registry, EveryFailureRaisesItsFixedMessage) {
@@ -165,6 +172,8 @@ TEST_F(Registry, EveryFailureRaisesItsFixedMessage) {
         {[&] { setValues(kCurrentUser, sub("nullTable"), nullptr); }, kNullObject},
         {[&] { setValues(kCurrentUser, none, vm.newHashtable()); }, kNullKey},
         {[&] { setValue(kCurrentUser, sub("new"), str("v"), vm.newPlainObject()); }, kNoType},
+        {[&] { setValue(kCurrentUser, sub("new"), str("v"), vm.newInstance("java/lang/Long")); }, kNoType},
+        {[&] { setValue(kCurrentUser, sub("new"), str("v"), vm.newInstance("java/lang/Double")); }, kNoType},
         {[&] { setValue(kCurrentUser, sub("new"), str("v"), vm.newStringArray({})); }, kNoType},
         {[&] { setValue(regkit::kNoSuchRoot, jpath, str("v"), one); }, kCreate},
         {[&] { setValues(regkit::kNoSuchRoot, jpath, vm.newHashtable()); }, kCreate},

@@ -368,7 +368,9 @@ void opReadData(Case& c, VelzipModel& m) {
 void opReadLine(Case& c, VelzipModel& m) {
     const bool reading = m.mode == VelzipModel::Reading;
     if (reading && (!m.reading.linesSafe || m.readBroken < 0)) {
-        return;  // bytes that are no modified UTF-8 must not reach NewStringUTF: no caller reads them so
+        // Binary or unknown bytes are no modified UTF-8, and readLineN hands them to
+        // NewStringUTF as they are; Java reads only text files by line.
+        return;
     }
     const size_t n = reading && m.readBroken == 0 ? chunk(m, 2047) : 0;
     Bytes line;
@@ -376,7 +378,9 @@ void opReadLine(Case& c, VelzipModel& m) {
     if (reading) {
         line.assign(m.reading.content.begin() + m.position, m.reading.content.begin() + m.position + n);
         if (!isModifiedUtf8(line.data(), line.size(), &want)) {
-            return;  // a line cut inside a character at 2047 bytes: see the note in the report
+            // A line longer than 2047 bytes is cut there, possibly inside a character, and
+            // readLineN hands that to NewStringUTF as it is (left as designed; not drawn).
+            return;
         }
     }
     const int inject = reading && n > 0 && m.readBroken == 0 ? injectedError(c) : 0;
