@@ -73,10 +73,12 @@ BOOL CALLBACK countOwnWindow(HWND window, LPARAM parameter) {
 
 ProcessSample sampleProcess() {
     ProcessSample s;
+    // Windows first: a process's first EnumWindows sets up Wine's window system (handles, a
+    // few thousand heap blocks), which must land before the baseline, not in the first delta.
+    EnumWindows(countOwnWindow, reinterpret_cast<LPARAM>(&s.windows));
     s.handles = countHandles();
     walkHeaps(&s);
     s.privateBytes = privateBytes();
-    EnumWindows(countOwnWindow, reinterpret_cast<LPARAM>(&s.windows));
     return s;
 }
 

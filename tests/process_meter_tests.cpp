@@ -56,8 +56,8 @@ TEST(ProcessMeter, AJniHostMadeAndDroppedLeavesNoHeap) {
         vm.newString(u"text");
         vm.env();
     };
-    for (int i = 0; i < 20; ++i) {
-        useOne();  // first-use allocations of the runtime and the host's registry
+    for (int i = 0; i < 20; ++i) {  // first-use allocations of the runtime and the host
+        useOne();
     }
     const ProcessSample before = sampleProcess();
     for (int i = 0; i < 200; ++i) {
