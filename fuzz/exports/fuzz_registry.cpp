@@ -245,29 +245,30 @@ Target writeTarget(RegistryCase& rc) {
     return Target{root, nullPath, keyPath(c, rc.run)};
 }
 
+std::string writeRefusal(const Target& to, bool nullObject) {
+    if (nullObject) {
+        return kNullValue;
+    }
+    if (to.nullPath) {
+        return kNullKey;
+    }
+    return to.root != kCurrentUser ? kCreateFailed : "";
+}
+
 void opSet(RegistryCase& rc) {
     Case& c = rc.c;
     const Target to = writeTarget(rc);
-    const jint root = to.root;
-    const bool nullPath = to.nullPath;
-    const KeyPath& path = to.path;
     const Name name = anyName(rc);
     regkit::RawValue stored;
     Storable kind;
     jobject value = anyValue(c, &stored, &kind);
-    c.call<void>(regkit::kSetValue, root, to.javaPath(c), javaName(c, name), value);
+    c.call<void>(regkit::kSetValue, to.root, to.javaPath(c), javaName(c, name), value);
     const std::string got = raised(c);
 
-    std::vector<std::string> allowed;
-    if (kind == Storable::Null) {
-        allowed = {kNullValue};
-    } else if (nullPath) {
-        allowed = {kNullKey};
-    } else if (root != kCurrentUser) {
-        allowed = {kCreateFailed};
-    } else {
+    std::vector<std::string> allowed{writeRefusal(to, kind == Storable::Null)};
+    if (allowed.front().empty()) {
         allowed = {kind == Storable::No ? kNoType : ""};
-        if (!path.strict) {
+        if (!to.path.strict) {
             allowed.push_back(kCreateFailed);
         }
         if (!name.strict && kind == Storable::Yes) {
@@ -275,12 +276,12 @@ void opSet(RegistryCase& rc) {
         }
     }
     c.expect(oneOf(got, allowed), [&] {
-        return "nativeSetRegistryValue(" + std::to_string(root) + ", " + show(path.text) + ", " +
+        return "nativeSetRegistryValue(" + std::to_string(to.root) + ", " + show(to.path.text) + ", " +
                (name.null ? "null" : show(name.text)) + ") raised " + quoted(got) + ", expected " +
                quoted(allowed.front());
     });
     if (got.empty() && kind == Storable::Yes) {
-        checkStored(c, root, path, name, stored);
+        checkStored(c, to.root, to.path, name, stored);
     }
 }
 

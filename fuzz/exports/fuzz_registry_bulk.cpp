@@ -26,9 +26,6 @@ struct Entry {
 void opSetAll(RegistryCase& rc) {
     Case& c = rc.c;
     const Target to = writeTarget(rc);
-    const jint root = to.root;
-    const bool nullPath = to.nullPath;
-    const KeyPath& path = to.path;
     const bool nullTable = c.rng.chance(4);
     jobject table = nullTable ? nullptr : c.vm.newHashtable();
     std::vector<Entry> entries;
@@ -61,19 +58,14 @@ void opSetAll(RegistryCase& rc) {
         }
         entries.push_back(e);
     }
-    c.call<void>(regkit::kSetValues, root, to.javaPath(c), table);
+    c.call<void>(regkit::kSetValues, to.root, to.javaPath(c), table);
     const std::string got = raised(c);
 
     // The walk in table order: the first entry that cannot be written ends it.
-    std::vector<std::string> allowed;
+    std::vector<std::string> allowed{writeRefusal(to, nullTable)};
     size_t written = 0;
-    if (nullTable) {
-        allowed = {kNullValue};
-    } else if (nullPath) {
-        allowed = {kNullKey};
-    } else if (root != kCurrentUser) {
-        allowed = {kCreateFailed};
-    } else {
+    if (allowed.front().empty()) {
+        allowed.clear();
         std::string stop;
         for (; written < entries.size() && stop.empty(); ++written) {
             const Entry& e = entries[written];
@@ -89,12 +81,12 @@ void opSetAll(RegistryCase& rc) {
             --written;
         }
         allowed.insert(allowed.begin(), stop);
-        if (!path.strict) {
+        if (!to.path.strict) {
             allowed.push_back(kCreateFailed);
         }
     }
     c.expect(oneOf(got, allowed), [&] {
-        return "nativeSetRegistryValues(" + std::to_string(root) + ", " + show(path.text) + ", " +
+        return "nativeSetRegistryValues(" + std::to_string(to.root) + ", " + show(to.path.text) + ", " +
                std::to_string(entries.size()) + " entries) raised " + quoted(got) + ", expected " +
                quoted(allowed.front());
     });
@@ -110,7 +102,7 @@ void opSetAll(RegistryCase& rc) {
                 shadowed || upperCase(fromAnsi(entries[j].name.ansi)) == upperCase(fromAnsi(e.name.ansi));
         }
         if (!shadowed) {
-            checkStored(c, root, path, e.name, e.stored);
+            checkStored(c, to.root, to.path, e.name, e.stored);
         }
     }
 }

@@ -77,6 +77,9 @@ jobject anyValue(Case& c, regkit::RawValue* stored, Storable* kind);
 std::string raised(Case& c);
 std::string quoted(const std::string& message);
 bool oneOf(const std::string& got, const std::vector<std::string>& allowed);
+// What every write refuses before it looks at the value: a null value or table, then a null
+// path, then a root that is no key. Empty when none applies.
+std::string writeRefusal(const Target& to, bool nullObject);
 // The value a write left, read past the library.
 void checkStored(Case& c, jint root, const KeyPath& path, const Name& name, const regkit::RawValue& want);
 
