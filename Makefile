@@ -7,7 +7,7 @@ CMAKE_FLAGS := -DCMAKE_TOOLCHAIN_FILE=cmake/toolchain-i686-mingw.cmake -DCMAKE_B
 JOBS := $(shell nproc 2>/dev/null || echo 2)
 MAKEFLAGS += --no-print-directory
 
-.PHONY: all setup configure build tour test bench fuzz-native format clean
+.PHONY: all setup configure build tour test bench fuzz-native mutants format clean
 
 all: tour
 
@@ -34,6 +34,11 @@ bench: build
 SECONDS ?= 60
 fuzz-native: setup
 	@scripts/fuzz-native $(SECONDS) $(if $(SEED),--seed $(SEED))
+
+# Plants each fault of scripts/mutants.list in a copy under $(BUILD)/mutants and runs the
+# tests that should see it; not part of `make test` (about twenty minutes).
+mutants: setup
+	@scripts/mutants
 
 format:
 	@clang-format -i $$(git ls-files '*.cpp' '*.h')
