@@ -11,7 +11,7 @@ MAKEFLAGS += --no-print-directory
 # the native fuzz target of the stand-in's container reader (scripts/fuzz-native), if present.
 SECONDS ?= 60
 
-.PHONY: all setup configure build tour test bench fuzz fuzz-native soak format clean
+.PHONY: all setup configure build tour test bench fuzz fuzz-native soak mutants format clean
 
 all: tour
 
@@ -46,6 +46,11 @@ fuzz-native: setup
 # Long loops of every family and thread churn, with leak figures (not part of `make test`).
 soak: build
 	@scripts/testbed scripts/soak
+
+# Plants each fault of scripts/mutants.list in a copy under $(BUILD)/mutants and runs the
+# tests that should see it; not part of `make test` (about twenty minutes).
+mutants: setup
+	@scripts/mutants
 
 format:
 	@clang-format -i $$(git ls-files '*.cpp' '*.h')

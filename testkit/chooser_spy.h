@@ -1,9 +1,9 @@
 // What libTessel_JNI hands to Windows when it shows a chooser, recorded through its import
 // table (api_spy.h): the OPENFILENAMEA and BROWSEINFOA it fills, the messages it sends to a
 // dialog, with the OK button's state right after each BFFM_ENABLEOK, and the windows it
-// raises. The dialogs' own checks can hide what the library asked for (Wine's folder
-// browser, for one, re-enables OK for any folder after the library's callback), so the
-// tests look at both.
+// raises and brings to the foreground. The dialogs' own checks can hide what the library asked for (Wine's
+// folder browser, for one, re-enables OK for any folder after the library's callback), so the tests look at
+// both.
 //
 // Header-only: the spies call comdlg32 and shell32, which only the chooser tests link.
 #pragma once
@@ -45,7 +45,8 @@ struct Log {
     std::vector<FileDialogCall> fileDialogs;
     std::vector<BrowseCall> browses;
     std::vector<SentMessage> sent;
-    std::vector<HWND> raised;  // SetWindowPos targets
+    std::vector<HWND> raised;      // SetWindowPos targets
+    std::vector<HWND> foreground;  // SetForegroundWindow targets
 };
 inline Log recorded;
 
@@ -117,9 +118,16 @@ inline BOOL WINAPI setWindowPos(HWND window, HWND after, int x, int y, int cx, i
     }
     return SetWindowPos(window, after, x, y, cx, cy, flags);
 }
+inline BOOL WINAPI setForegroundWindow(HWND window) {
+    {
+        std::lock_guard<std::mutex> lock(recorded.mu);
+        recorded.foreground.push_back(window);
+    }
+    return SetForegroundWindow(window);
+}
 
 // Empties the log and points the library's imports at the spies; false when one of the
-// five imports is missing.
+// six imports is missing.
 inline bool install(HMODULE library) {
     {
         std::lock_guard<std::mutex> lock(recorded.mu);
@@ -127,12 +135,14 @@ inline bool install(HMODULE library) {
         recorded.browses.clear();
         recorded.sent.clear();
         recorded.raised.clear();
+        recorded.foreground.clear();
     }
     return patchImport(library, "GetOpenFileNameA", reinterpret_cast<void*>(getOpenFileName)) &&
            patchImport(library, "GetSaveFileNameA", reinterpret_cast<void*>(getSaveFileName)) &&
            patchImport(library, "SHBrowseForFolderA", reinterpret_cast<void*>(browseForFolder)) &&
            patchImport(library, "SendMessageA", reinterpret_cast<void*>(sendMessage)) &&
-           patchImport(library, "SetWindowPos", reinterpret_cast<void*>(setWindowPos));
+           patchImport(library, "SetWindowPos", reinterpret_cast<void*>(setWindowPos)) &&
+           patchImport(library, "SetForegroundWindow", reinterpret_cast<void*>(setForegroundWindow));
 }
 
 // Copies of the log, taken under its lock.
@@ -147,6 +157,10 @@ inline std::vector<BrowseCall> browses() {
 inline std::vector<HWND> raised() {
     std::lock_guard<std::mutex> lock(recorded.mu);
     return recorded.raised;
+}
+inline std::vector<HWND> foregrounded() {
+    std::lock_guard<std::mutex> lock(recorded.mu);
+    return recorded.foreground;
 }
 // The messages of one kind the library sent, in order.
 inline std::vector<SentMessage> sent(UINT message) {

@@ -138,6 +138,8 @@ TEST_F(Placement, CentringAndActivateWindowUseTheLow32BitsAndHandlesAreStoredSig
     const auto low = static_cast<uint32_t>(reinterpret_cast<uintptr_t>(first));
     lib.call<void>(kActivate, jclass{}, static_cast<jlong>((uint64_t{0xdeadbeef} << 32) | low));
     EXPECT_EQ(spy::raised(), std::vector<HWND>{first});
+    // Wine's SetWindowPos already brings a window of ours forward; the library asks as well.
+    EXPECT_EQ(spy::foregrounded(), std::vector<HWND>{first});
     EXPECT_EQ(GetForegroundWindow(), first);
 
     jobject chooser = newChooser(vm, jnihost::kDirectoryChooserClass, 1000 + (int64_t{7} << 32), 500);
@@ -147,10 +149,41 @@ TEST_F(Placement, CentringAndActivateWindowUseTheLow32BitsAndHandlesAreStoredSig
     EXPECT_EQ(std::vector<LONG>({frame.left, frame.top, frame.right - frame.left}),
               std::vector<LONG>({800, 350, 400}))
         << "(1000, 500) less halves of 400 x 301, size kept";
+    vm.setLongField(chooser, "centerx", 100);
+    vm.setLongField(chooser, "centery", 150);
+    centerWindowAt(env(), chooser, kDirectoryChooserClass, first);
+    GetWindowRect(first, &frame);
+    EXPECT_EQ(std::make_pair(frame.left, frame.top), std::make_pair(0L, 0L)) << "never off screen";
     storeWindowHandle(env(), chooser, kDirectoryChooserClass, reinterpret_cast<HWND>(0x80001234u));
     EXPECT_EQ(vm.longField(chooser, "hwnd"), int64_t{-0x7fffedcc});
     DestroyWindow(first);
     DestroyWindow(second);
+}
+
+TEST_F(Placement, FileDialogHookActsOnlyOnceTheDialogIsReady) {
+    HWND window = createTopLevel(true, 10, 10, 400, 300);
+    ASSERT_NE(window, nullptr);
+    jobject chooser = newChooser(vm, jnihost::kFileChooserClass, 1000, 500);
+    ChooserContext context{env(), chooser};
+    OPENFILENAMEA dialog{};
+    dialog.lCustData = reinterpret_cast<LPARAM>(&context);
+    OFNOTIFYA notify{};
+    notify.hdr.hwndFrom = window;
+    notify.lpOFN = &dialog;
+    const auto hook = [&](UINT code) {
+        notify.hdr.code = code;
+        return fileDialogHook(window, WM_NOTIFY, 0, reinterpret_cast<LPARAM>(&notify));
+    };
+    for (UINT code : {UINT(CDN_SELCHANGE), UINT(CDN_FOLDERCHANGE), UINT(CDN_TYPECHANGE), UINT(CDN_FILEOK)}) {
+        EXPECT_EQ(hook(code), 0u) << code;
+    }
+    EXPECT_EQ(vm.longField(chooser, "hwnd"), 0) << "nothing stored before CDN_INITDONE";
+    EXPECT_EQ(hook(CDN_INITDONE), 0u);
+    EXPECT_EQ(vm.longField(chooser, "hwnd"), static_cast<int32_t>(reinterpret_cast<intptr_t>(window)));
+    RECT frame{};
+    GetWindowRect(window, &frame);
+    EXPECT_EQ(std::make_pair(frame.left, frame.top), std::make_pair(800L, 350L));
+    DestroyWindow(window);
 }
 
 // ---- The file dialogs ----
@@ -298,6 +331,7 @@ TEST_F(FolderBrowser, ValidatorStatusLineStartPathAndChosenFolder) {
     EXPECT_EQ(spy::sent(BFFM_SETSTATUSTEXTA).size(), 1u) << "a null text sends nothing";
     ASSERT_EQ(spy::sent(BFFM_SETSELECTIONA).size(), 1u);
     EXPECT_EQ(spy::sent(BFFM_SETSELECTIONA)[0].text, path("start"));
+    EXPECT_EQ(spy::sent(BFFM_SETSELECTIONA)[0].wParam, WPARAM{TRUE}) << "a path, not an item list";
     ASSERT_EQ(spy::browses().size(), 1u);
     EXPECT_EQ(spy::browses()[0].flags, UINT{BIF_STATUSTEXT}) << "only the low 32 bits of browseFlags";
     EXPECT_EQ(spy::browses()[0].title, "Pick a folder");

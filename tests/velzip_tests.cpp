@@ -338,9 +338,11 @@ TEST_F(VelzipCodec, BuffersRoundTrip) {
             ASSERT_GT(pack.size(), 16u);
             // decodeMemN wants dstSize >= srcSize * 1.01 + 36 as well.
             const size_t dstSize = std::max<size_t>(size, pack.size() * 1.01 + 37);
-            jbyteArray dst = vm.newByteArray(Bytes(dstSize));
+            jbyteArray dst = vm.newByteArray(Bytes(dstSize, 0x55));
             EXPECT_EQ(vz.decode(dst, jint(dstSize), vm.newByteArray(pack), jint(pack.size())), int(size));
             Bytes back = vm.byteArrayValue(dst);
+            EXPECT_EQ(Bytes(back.begin() + size, back.end()), Bytes(dstSize - size, 0x55))
+                << "only the bytes produced are copied";
             back.resize(size);
             EXPECT_EQ(back, data);
         }
@@ -588,6 +590,7 @@ TEST_F(VelzipCodec, BufferSizeFlagsAreOneOnlyForExactlyOne) {
     mark();
     EXPECT_EQ(vz.sizeofCompressed(1000, 1, 2, 0xFF), 1016);
     EXPECT_EQ(log(), "new SetVersion(3,8) SetCompressFlags(1,0) GetSizeofCompressedBuffer(1000,1,0,0)");
+    EXPECT_EQ(vz.sizeofCompressed(1000, 2, 1, 0), 1013) << "a first flag of 2 is not 1 either";
     EXPECT_EQ(vz.sizeofCompressed(1000, 0, 1, 1), 1024);
     EXPECT_EQ(vz.sizeofCompressed(1000, 1, 1, 1), 1040);
     EXPECT_EQ(vz.sizeofCompressed(-1, 1, 1, 1), -1) << "0xFFFFFFFF, saturated, keeps its bits";

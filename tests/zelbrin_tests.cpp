@@ -222,6 +222,10 @@ TEST_F(Zelbrin, CodecNeverReadsOrWritesPastItsBuffers) {
 TEST_F(Zelbrin, BufferSizeQueriesFollowTheirFlags) {
     EXPECT_EQ(Zel_Compress::GetSizeofCompressedBuffer(1000, 0, 0, 0), 1000u);
     EXPECT_EQ(Zel_Compress::GetSizeofCompressedBuffer(1000, 0, 1, 0), 1013u) << "zlib's bound";
+    // Rounding up to 16 leaves a multiple of 16, zero included, as it is.
+    EXPECT_EQ(Zel_Compress::GetSizeofCompressedBuffer(1000, 1, 0, 1), 1024u);
+    EXPECT_EQ(Zel_Compress::GetSizeofCompressedBuffer(992, 1, 0, 1), 1008u);
+    EXPECT_EQ(Zel_Compress::GetSizeofCompressedBuffer(0, 0, 0, 1), 0u);
     Bytes packed(2000);
     ASSERT_GT(Zel_Compress().Compress(packed.data(), 2000, sampleData(999, true).data(), 999), 0u);
     EXPECT_EQ(Zel_Compress::GetSizeofUnCompressedBuffer(packed.data(), 0, 0, 0), 999u);
@@ -267,6 +271,11 @@ TEST_F(Zelbrin, VelformFormatsAnyLengthIntoItsOwnStorage) {
     ASSERT_NE(text, nullptr);
     EXPECT_EQ(std::string(text), "File " + path + " does not exist.");
     EXPECT_STREQ(velform("short %s", "again"), "short again");
+    // Texts growing a byte at a time meet the storage at its exact size (it grows to fit).
+    for (size_t length = 100001; length < 100040; ++length) {
+        const std::string longer(length, 'q');
+        EXPECT_EQ(std::string(velform("%s", longer.c_str())), longer) << length;
+    }
 }
 
 }  // namespace
