@@ -164,7 +164,7 @@ TEST_F(Placement, FileDialogHookActsOnlyOnceTheDialogIsReady) {
     HWND window = createTopLevel(true, 10, 10, 400, 300);
     ASSERT_NE(window, nullptr);
     jobject chooser = newChooser(vm, jnihost::kFileChooserClass, 1000, 500);
-    ChooserContext context{env(), chooser};
+    ChooserContext context{env(), chooser, false};
     OPENFILENAMEA dialog{};
     dialog.lCustData = reinterpret_cast<LPARAM>(&context);
     OFNOTIFYA notify{};
