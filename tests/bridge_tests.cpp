@@ -10,13 +10,16 @@
 #include <vector>
 
 #include "bridge/text_conversion.h"
+#include "heap_spy.h"
 #include "host_fixture.h"
+#include "process_meter.h"
 
 namespace {
 
 const char kGetCursorPos[] = "_Java_com_velmor_coreutil_corenative_CoreNativeNT_getCursorPos@8";
 const char kSetCursorPos[] = "_Java_com_velmor_coreutil_corenative_CoreNativeNT_setCursorPos@12";
 const char kGetEnv[] = "_Java_com_velmor_coreutil_corenative_CoreNativeNT_getEnvVariable@12";
+const char kEncode[] = "_Java_com_velmor_coreutil_toolkit_VelzipFile_encodeMemN@24";
 const char kSpecialFolder[] = "_Java_com_velmor_coreutil_corenative_CoreNativeNT_getSpecialFolderLocation@12";
 
 std::string native(JNIEnv* env, jstring s) {
@@ -141,6 +144,25 @@ TEST_F(TextConversion, LongTextNeedsNoFixedBuffer) {
     EXPECT_EQ(vm.stringValue(toJavaString(env(), back.c_str())), text);
 }
 
+// One encodeMemN on a thread of its own, whose first heap allocation in the library fails
+// when `fail` is set.
+struct Encode {
+    jnihost::Library* lib;
+    jbyteArray dst, src;
+    bool fail;
+    jint result;
+    size_t failedSize;
+};
+
+DWORD WINAPI encodeThread(void* parameter) {
+    auto* run = static_cast<Encode*>(parameter);
+    testkit::heap_spy::reset();
+    testkit::heap_spy::failAllocation(run->fail ? 1 : 0);
+    run->result = run->lib->call<jint>(kEncode, jclass{}, run->dst, 200, run->src, 100);
+    run->failedSize = testkit::heap_spy::failedSize();
+    return 0;
+}
+
 // Loading the library switches off thread notifications for it, which Windows allows only
 // for a module without static TLS.
 using EntryPoint = HostTest;
@@ -158,6 +180,39 @@ TEST_F(EntryPoint, ThreadNotificationsAreOffOnceLoaded) {
     EXPECT_TRUE(flags & kNoThreadNotifications);
     // The test program's own modules keep theirs: the flag tells the modules apart.
     EXPECT_FALSE(loaderFlags(GetModuleHandleA(nullptr)) & kNoThreadNotifications);
+}
+
+// Without TLS callbacks nothing frees per-thread records of the runtime at thread exit, so
+// no path of the library may make any, the failed allocation included: short-lived threads
+// that each meet one leave no more behind than threads whose calls succeed (what those
+// leave is the host's and Wine's own per-thread cost).
+TEST_F(EntryPoint, AFailedAllocationOnShortLivedThreadsLeavesNothingBehind) {
+    jbyteArray src = vm.newByteArray(std::vector<uint8_t>(100, 'a'));
+    jbyteArray dst = vm.newByteArray(std::vector<uint8_t>(200));
+    ASSERT_GT(lib.call<jint>(kEncode, jclass{}, dst, 200, src, 100), 0)
+        << "the compressor exists from here on";
+    ASSERT_TRUE(testkit::heap_spy::install(static_cast<HMODULE>(lib.handle())));
+
+    const auto churn = [&](int threads, bool fail) {
+        Encode run{&lib, dst, src, fail, -1, 0};
+        const testkit::ProcessSample before = testkit::sampleProcess();
+        for (int i = 0; i < threads; ++i) {
+            HANDLE thread = CreateThread(nullptr, 0, encodeThread, &run, 0, nullptr);
+            EXPECT_NE(thread, nullptr);
+            WaitForSingleObject(thread, INFINITE);
+            CloseHandle(thread);
+            EXPECT_EQ(run.result > 0, !fail);
+            EXPECT_EQ(run.failedSize, fail ? 200u : 0u) << "the output buffer is the one refused";
+        }
+        return testkit::sampleProcess() - before;
+    };
+    churn(50, true);  // Wine's and the host's first-use costs settle
+    const testkit::ProcessSample succeeding = churn(500, false);
+    const testkit::ProcessSample failing = churn(500, true);
+    EXPECT_LE(failing.handles - succeeding.handles, 1)
+        << "failing: " << testkit::describe(failing) << "; succeeding: " << testkit::describe(succeeding);
+    EXPECT_LT(failing.heapBytes - succeeding.heapBytes, 8 * 1024)
+        << "failing: " << testkit::describe(failing) << "; succeeding: " << testkit::describe(succeeding);
 }
 
 using Cursor = HostTest;
