@@ -1,6 +1,7 @@
 // The host side of the JNI host: the classes it knows, the object store, the host-side API
-// used by tests, and Library, which calls the DLL's exports through an assembly thunk so
-// that a wrong argument size (@N) shows up as a reported stack imbalance, not a crash.
+// used by tests, and Library, which calls the DLL's exports: on x86 through an assembly
+// thunk, so that a wrong argument size (@N) shows up as a reported stack imbalance, not a
+// crash; on x64 through a plain call of as many integer arguments as the native takes.
 #include <windows.h>
 
 #include <algorithm>
@@ -682,11 +683,44 @@ void Vm::resetCallCounts() {
 
 // ---- Library ----
 
+namespace {
+
+#if defined(_WIN64)
+// x64 has one calling convention: the first four arguments in registers, the rest on the
+// stack, each in a slot of 8 bytes; the caller owns the stack, so nothing can be unbalanced.
+// Every JNI argument here is an integer or a pointer, so a function of N 64-bit integers
+// receives the same registers and slots as the native's own signature.
+uint64_t callNative(const void* fn, const uintptr_t* a, int count, int32_t* imbalance) {
+    using U = uintptr_t;
+    *imbalance = 0;
+    const auto entry = reinterpret_cast<uintptr_t>(fn);
+    switch (count) {
+        case 2:
+            return reinterpret_cast<U (*)(U, U)>(entry)(a[0], a[1]);
+        case 3:
+            return reinterpret_cast<U (*)(U, U, U)>(entry)(a[0], a[1], a[2]);
+        case 4:
+            return reinterpret_cast<U (*)(U, U, U, U)>(entry)(a[0], a[1], a[2], a[3]);
+        case 5:
+            return reinterpret_cast<U (*)(U, U, U, U, U)>(entry)(a[0], a[1], a[2], a[3], a[4]);
+        case 6:
+            return reinterpret_cast<U (*)(U, U, U, U, U, U)>(entry)(a[0], a[1], a[2], a[3], a[4], a[5]);
+        case 7:
+            return reinterpret_cast<U (*)(U, U, U, U, U, U, U)>(entry)(a[0], a[1], a[2], a[3], a[4], a[5],
+                                                                       a[6]);
+        case 8:
+            return reinterpret_cast<U (*)(U, U, U, U, U, U, U, U)>(entry)(a[0], a[1], a[2], a[3], a[4], a[5],
+                                                                          a[6], a[7]);
+        default:  // the env alone
+            return reinterpret_cast<U (*)(U)>(entry)(a[0]);
+    }
+}
+#else
 // uint64_t jnihost_call_stdcall(fn, slots, count, int32_t* imbalance), cdecl.
 // Copies the slots to a 16-byte aligned block on the stack and calls fn. Afterwards ESP
 // should be where a __stdcall callee that popped exactly count*4 bytes leaves it; the
 // difference goes to *imbalance (positive: it popped too much). ESP is restored from EBX.
-extern "C" uint64_t jnihost_call_stdcall(const void* fn, const uint32_t* slots, int count,
+extern "C" uint64_t jnihost_call_stdcall(const void* fn, const uintptr_t* slots, int count,
                                          int32_t* imbalance);
 asm(R"(
     .text
@@ -725,6 +759,38 @@ _jnihost_call_stdcall:
     ret
 )");
 
+uint64_t callNative(const void* fn, const uintptr_t* slots, int count, int32_t* imbalance) {
+    return jnihost_call_stdcall(fn, slots, count, imbalance);
+}
+#endif
+
+}  // namespace
+
+const char* exportNameFor(void* module, const char* x86Name, int javaArgCount, std::string* storage) {
+    auto exported = [module](const std::string& name) {
+        return module != nullptr && GetProcAddress(static_cast<HMODULE>(module), name.c_str()) != nullptr;
+    };
+#if defined(_WIN64)
+    std::string plain = x86Name;
+    const size_t at = plain.rfind('@');
+    if (at != std::string::npos && at + 1 < plain.size() &&
+        plain.find_first_not_of("0123456789", at + 1) == std::string::npos) {
+        plain.erase(at);
+    }
+    if (plain.rfind("_Java_", 0) == 0) {
+        plain.erase(0, 1);
+    }
+    if (!exported(plain) && javaArgCount == 0 && exported(plain + "__")) {
+        plain += "__";
+    }
+    *storage = plain;
+#else
+    (void)javaArgCount;
+    *storage = x86Name;
+#endif
+    return exported(*storage) ? storage->c_str() : nullptr;
+}
+
 Library::Library(Vm& vm, const char* path) : vm_(vm) {
     module_ = LoadLibraryA(path);
     if (!module_) {
@@ -743,9 +809,14 @@ void* Library::find(const char* exportName) const {
                    : nullptr;
 }
 
-uint64_t Library::invoke(const char* exportName, const uint32_t* slots, int slotCount) {
+uint64_t Library::invoke(const char* exportName, const uintptr_t* slots, int slotCount) {
     VmState& s = vm_.state();
-    const void* fn = find(exportName);
+    // The env and the class or object come first (only x64 counts the rest: one slot each).
+    std::string name;
+    const void* fn = nullptr;
+    if (const char* found = exportNameFor(module_, exportName, slotCount - 2, &name)) {
+        fn = find(found);
+    }
     if (!fn) {
         s.report(std::string(exportName) + ": " + (module_ ? "no such export" : "the library is not loaded"));
         return 0;
@@ -756,7 +827,7 @@ uint64_t Library::invoke(const char* exportName, const uint32_t* slots, int slot
         serial = s.nextSerial;
     }
     int32_t imbalance = 0;
-    const uint64_t result = jnihost_call_stdcall(fn, slots, slotCount, &imbalance);
+    const uint64_t result = callNative(fn, slots, slotCount, &imbalance);
     if (imbalance != 0) {
         s.report(std::string(exportName) + ": stack imbalance of " + std::to_string(imbalance) +
                  " bytes: the callee popped " + std::to_string(slotCount * 4 + imbalance) + " bytes, its " +
