@@ -11,7 +11,6 @@ import argparse
 import pathlib
 import re
 import subprocess
-import sys
 import zlib
 
 # What may sit in dist/ (x86) or dist/x64/: the loose files, the x64 folder, and what
@@ -95,11 +94,10 @@ def main():
             failures.append("%s does not belong in %s" % (entry.name, a.dist))
 
     print("%s: %s checked" % (a.arch, ", ".join(pathlib.Path(d).name for d in a.dlls)))
-    if failures:
-        print("\n".join("FAIL: " + f for f in failures))
-        return 1
-    return 0
+    for failure in failures:
+        print("FAIL: " + failure)
+    return 1 if failures else 0
 
 
 if __name__ == "__main__":
-    sys.exit(main())
+    raise SystemExit(main())
