@@ -7,7 +7,7 @@ CMAKE_FLAGS := -DCMAKE_TOOLCHAIN_FILE=cmake/toolchain-i686-mingw.cmake -DCMAKE_B
 JOBS := $(shell nproc 2>/dev/null || echo 2)
 MAKEFLAGS += --no-print-directory
 
-.PHONY: all setup configure build tour test bench dist repro format clean
+.PHONY: all setup configure build tour test bench dist repro fuzz-native format clean
 
 all: tour
 
@@ -40,6 +40,12 @@ dist: build
 # Two clean builds of this commit in two other folders must give the same bytes.
 repro: setup
 	@scripts/check-reproducible
+
+# The stand-in's container reader under libFuzzer, natively: `make fuzz-native SECONDS=300`,
+# with SEED=N to replay a run.
+SECONDS ?= 60
+fuzz-native: setup
+	@scripts/fuzz-native $(SECONDS) $(if $(SEED),--seed $(SEED))
 
 format:
 	@clang-format -i $$(git ls-files '*.cpp' '*.h')

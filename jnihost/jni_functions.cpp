@@ -687,8 +687,10 @@ void releaseElements(Call& c, Obj* o, const void* elems, jint mode, BlockKind ki
         return;
     if (mode != 0 && mode != JNI_COMMIT && mode != JNI_ABORT)
         c.fail("unknown mode " + std::to_string(mode));
-    if (mode != JNI_ABORT)
+    if (mode != JNI_ABORT) {
         std::memcpy(b->owner->bytes.data(), b->data.get(), std::min(b->size, b->owner->bytes.size()));
+        ++c.vm().copyBacks;
+    }
     if (mode != JNI_COMMIT)
         c.retire(b);
 }

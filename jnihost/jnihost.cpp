@@ -674,9 +674,14 @@ int Vm::callCount(const std::string& functionName) const {
     return 0;
 }
 
+int Vm::copyBackCount() const {
+    return state_->copyBacks;
+}
+
 void Vm::resetCallCounts() {
     for (auto& c : state_->counts)
         c = 0;
+    state_->copyBacks = 0;
 }
 
 // ---- Text ----

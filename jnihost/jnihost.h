@@ -114,6 +114,8 @@ public:
     // ---- Counters for tests ----
     // How many times a JNI function was called on any env, by its jni.h name ("FindClass").
     int callCount(const std::string& functionName) const;
+    // How many array element releases copied the elements back (mode 0 or JNI_COMMIT).
+    int copyBackCount() const;
     void resetCallCounts();
 
     VmState& state();

@@ -123,6 +123,7 @@ struct VmState {
     std::set<std::string> failClass, failNew;
     std::set<std::pair<std::string, std::string>> failMember;
     std::array<std::atomic<int>, kSlotCount> counts{};
+    std::atomic<int> copyBacks{0};  // element releases that copied the block into the array
 
     mutable std::mutex violationMu;
     std::vector<std::string> violationList;

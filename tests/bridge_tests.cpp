@@ -1,9 +1,13 @@
 // Bridge core: the text conversions (linked in directly) and the CoreNativeNT exports.
 #include <windows.h>
 #include <shlobj.h>
+#include <winternl.h>
 
 #include <cstring>
+#include <fstream>
+#include <iterator>
 #include <string>
+#include <vector>
 
 #include "bridge/text_conversion.h"
 #include "host_fixture.h"
@@ -27,6 +31,65 @@ POINT cursor() {
     return p;
 }
 
+// The file a module was loaded from.
+std::string modulePath(HMODULE module) {
+    char path[MAX_PATH] = {};
+    GetModuleFileNameA(module, path, MAX_PATH);
+    return path;
+}
+
+// The PE data directory `index` as the file on disk declares it (this build's own bitness).
+IMAGE_DATA_DIRECTORY dataDirectoryInFile(const std::string& path, int index) {
+    std::ifstream in(path, std::ios::binary);
+    const std::vector<char> bytes{std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
+    IMAGE_DOS_HEADER dos{};
+    IMAGE_NT_HEADERS nt{};
+    if (bytes.size() < sizeof dos) {
+        return {};
+    }
+    std::memcpy(&dos, bytes.data(), sizeof dos);
+    if (dos.e_magic != IMAGE_DOS_SIGNATURE || bytes.size() < dos.e_lfanew + sizeof nt) {
+        return {};
+    }
+    std::memcpy(&nt, bytes.data() + dos.e_lfanew, sizeof nt);
+    return nt.OptionalHeader.DataDirectory[index];
+}
+
+// The head of the loader's own record of a module (the part every Windows version shares);
+// Flags carries the loader's per-module switches.
+struct LoaderEntry {
+    LIST_ENTRY inLoadOrder;
+    LIST_ENTRY inMemoryOrder;
+    LIST_ENTRY inInitializationOrder;
+    void* base;
+    void* entryPoint;
+    ULONG imageSize;
+    UNICODE_STRING fullName;
+    UNICODE_STRING baseName;
+    ULONG flags;
+};
+constexpr ULONG kNoThreadNotifications = 0x00040000;  // set by DisableThreadLibraryCalls
+
+// The loader's flags of a loaded module, or ~0 when the loader has no record of it.
+ULONG loaderFlags(HMODULE module) {
+    using QueryProcess = NTSTATUS(WINAPI*)(HANDLE, PROCESSINFOCLASS, void*, ULONG, ULONG*);
+    const auto query = reinterpret_cast<QueryProcess>(
+        reinterpret_cast<void*>(GetProcAddress(GetModuleHandleA("ntdll.dll"), "NtQueryInformationProcess")));
+    PROCESS_BASIC_INFORMATION basic{};
+    if (query == nullptr ||
+        query(GetCurrentProcess(), ProcessBasicInformation, &basic, sizeof basic, nullptr) != 0) {
+        return ~0ul;
+    }
+    const LIST_ENTRY* head = &basic.PebBaseAddress->Ldr->InMemoryOrderModuleList;
+    for (const LIST_ENTRY* link = head->Flink; link != head; link = link->Flink) {
+        const auto* entry = CONTAINING_RECORD(link, LoaderEntry, inMemoryOrder);
+        if (entry->base == module) {
+            return entry->flags;
+        }
+    }
+    return ~0ul;
+}
+
 using TextConversion = HostTest;
 
 TEST_F(TextConversion, EmptyTextStaysEmptyNotNull) {
@@ -40,7 +103,9 @@ TEST_F(TextConversion, EmptyTextStaysEmptyNotNull) {
 }
 
 TEST_F(TextConversion, CharacterOutsideCodePageBecomesDefaultCharacter) {
-    EXPECT_EQ(native(env(), vm.newString(u"a\u4e2d\u00e9b")), "a?\xe9" "b");
+    EXPECT_EQ(native(env(), vm.newString(u"a\u4e2d\u00e9b")),
+              "a?\xe9"
+              "b");
 }
 
 TEST_F(TextConversion, EmbeddedNulEndsTheNativeText) {
@@ -74,6 +139,25 @@ TEST_F(TextConversion, LongTextNeedsNoFixedBuffer) {
     const std::string back = native(env(), vm.newString(text));
     EXPECT_EQ(back.size(), 100003u);
     EXPECT_EQ(vm.stringValue(toJavaString(env(), back.c_str())), text);
+}
+
+// Loading the library switches off thread notifications for it, which Windows allows only
+// for a module without static TLS.
+using EntryPoint = HostTest;
+
+TEST_F(EntryPoint, TheBuiltLibraryHasNoTlsDirectory) {
+    const auto module = static_cast<HMODULE>(lib.handle());
+    const IMAGE_DATA_DIRECTORY tls = dataDirectoryInFile(modulePath(module), IMAGE_DIRECTORY_ENTRY_TLS);
+    EXPECT_EQ(tls.VirtualAddress, 0u);
+    EXPECT_EQ(tls.Size, 0u);
+}
+
+TEST_F(EntryPoint, ThreadNotificationsAreOffOnceLoaded) {
+    const ULONG flags = loaderFlags(static_cast<HMODULE>(lib.handle()));
+    ASSERT_NE(flags, ~0ul) << "the loader lists the library";
+    EXPECT_TRUE(flags & kNoThreadNotifications);
+    // The test program's own modules keep theirs: the flag tells the modules apart.
+    EXPECT_FALSE(loaderFlags(GetModuleHandleA(nullptr)) & kNoThreadNotifications);
 }
 
 using Cursor = HostTest;

@@ -42,6 +42,7 @@ TEST_F(Registry, EachKindRoundTripsWithItsRegistryType) {
     for (const Case& c : cases) {
         set(str(c.name), c.value);
         EXPECT_EQ(raised(), "") << c.name;
+        EXPECT_EQ(vm.copyBackCount(), 0) << c.name << ": an array only read is not copied back";
         const regkit::RawValue raw = rawValue(path, c.name);
         EXPECT_EQ(raw.type, c.type) << c.name;
         EXPECT_EQ(raw.data, c.stored) << c.name;

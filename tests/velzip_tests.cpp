@@ -326,6 +326,42 @@ TEST_F(VelzipCodec, BuffersRoundTrip) {
     EXPECT_EQ(vz.errorId(), 0);
 }
 
+// Java may pass one array as both source and destination; the host copies elements as a
+// JVM does, so releasing the source with a copy back would put the input over the output.
+TEST_F(VelzipCodec, OneArrayAsSourceAndDestinationKeepsTheOutput) {
+    const Bytes data = sampleData(100, true);
+    Bytes buffer = data;
+    buffer.resize(200);
+    jbyteArray same = vm.newByteArray(buffer);
+    const Bytes pack = vz.pack(data);
+    ASSERT_EQ(vz.encode(same, 200, same, 100), int(pack.size()));
+    Bytes packed = vm.byteArrayValue(same);
+    packed.resize(pack.size());
+    EXPECT_EQ(packed, pack);
+
+    ASSERT_EQ(vz.decode(same, 200, same, jint(pack.size())), 100);
+    Bytes back = vm.byteArrayValue(same);
+    back.resize(100);
+    EXPECT_EQ(back, data);
+}
+
+// Arrays the library only reads are released without a copy back: it would cost a full copy,
+// and could overwrite what another thread wrote into the array meanwhile.
+TEST_F(VelzipCodec, ArraysOnlyReadAreNeverCopiedBack) {
+    const Bytes data = sampleData(3000, true);
+    jbyteArray header = vm.newByteArray(vz.pack(data));
+    ASSERT_TRUE(vz.open(dir.file("w.vz"), 1));
+    mark();
+    EXPECT_EQ(vz.writeData(data), 1);
+    EXPECT_GT(vz.encode(vm.newByteArray(Bytes(4000)), 4000, vm.newByteArray(data), 3000), 0);
+    EXPECT_EQ(vz.decode(vm.newByteArray(Bytes(4000)), 4000, header, 100), 0) << "header only: no data";
+    for (const char* query : {kCompressedOfHeader, kUncompressedOfHeader, kSizeofUnCompressed}) {
+        EXPECT_GT(vz.headerCall(query, header), 0) << query;
+    }
+    EXPECT_EQ(vm.callCount("ReleaseByteArrayElements"), 6);
+    EXPECT_EQ(vm.copyBackCount(), 0);
+}
+
 TEST_F(VelzipCodec, SizeChecksAtTheirExactEdges) {
     struct Edge {
         const char* name;

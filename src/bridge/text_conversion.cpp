@@ -2,7 +2,7 @@
 
 #include <windows.h>
 
-char* toNativeString(JNIEnv* env, jstring text) {
+char* toNativeString(JNIEnv* env, jstring text, size_t* byteCount) {
     const jchar* units = env->GetStringChars(text, nullptr);
     if (units == nullptr) {
         return nullptr;  // out of memory: the virtual machine has its error pending
@@ -16,6 +16,9 @@ char* toNativeString(JNIEnv* env, jstring text) {
     char* block = static_cast<char*>(std::calloc(static_cast<size_t>(n) + 1, 1));
     if (block != nullptr) {
         WideCharToMultiByte(CP_ACP, 0, wide, length, block, n, nullptr, nullptr);
+        if (byteCount != nullptr) {
+            *byteCount = static_cast<size_t>(n);
+        }
     }
     env->ReleaseStringChars(text, units);
     return block;

@@ -18,8 +18,9 @@ using NativeText = HeapBlock<char>;
 
 // Converts a Java string (never null) to native text sized exactly by a first conversion
 // call. Characters the code page lacks become its default character. Null when the block
-// cannot be allocated; the caller frees the result.
-char* toNativeString(JNIEnv* env, jstring text);
+// cannot be allocated; the caller frees the result. When byteCount is given, it receives
+// the text's size in bytes without the terminator (the answer of the sizing call).
+char* toNativeString(JNIEnv* env, jstring text, size_t* byteCount = nullptr);
 
 // Makes a new Java string from native text (never null). Null when no memory is left, with
 // the virtual machine's error pending where it was NewString that failed.

@@ -1,8 +1,6 @@
 // Value conversion and key helpers of the WinRegistry family.
 #include "registry/registry_values.h"
 
-#include <malloc.h>
-
 #include <cstdint>
 #include <cstring>
 
@@ -14,8 +12,9 @@ const char kStringClass[] = "java/lang/String";
 const char kIntegerClass[] = "java/lang/Integer";
 const char kByteArrayClass[] = "[B";
 
-// Byte-array elements taken with GetByteArrayElements, released in mode 0 (copy back and
-// release) when the guard goes out of scope.
+// Byte-array elements taken with GetByteArrayElements only to be read, released with
+// JNI_ABORT when the guard goes out of scope: nothing to copy back, and a copy back could
+// overwrite what another thread wrote into the array meanwhile.
 struct PinnedBytes {
     JNIEnv* env;
     jbyteArray array;
@@ -23,7 +22,7 @@ struct PinnedBytes {
 
     ~PinnedBytes() {
         if (elements != nullptr) {
-            env->ReleaseByteArrayElements(array, elements, 0);
+            env->ReleaseByteArrayElements(array, elements, JNI_ABORT);
         }
     }
 };
@@ -55,8 +54,8 @@ bool exceptionPending(JNIEnv* env) {
     return env->ExceptionOccurred() != nullptr;
 }
 
-bool toNativeTextOrRaise(JNIEnv* env, jstring text, NativeText* result) {
-    result->reset(toNativeString(env, text));
+bool toNativeTextOrRaise(JNIEnv* env, jstring text, NativeText* result, size_t* byteCount) {
+    result->reset(toNativeString(env, text, byteCount));
     if (*result) {
         return true;
     }
@@ -146,16 +145,16 @@ LONG writeRegistryValue(JNIEnv* env, HKEY key, jstring valueName, jobject value)
     DWORD size = 0;
     switch (type) {
         case REG_SZ: {
-            if (!toNativeTextOrRaise(env, static_cast<jstring>(value), &text)) {
+            size_t bytes = 0;
+            if (!toNativeTextOrRaise(env, static_cast<jstring>(value), &text, &bytes)) {
                 return ERROR_SUCCESS;
             }
-            // The conversion sizes its block as the converted bytes plus the terminator, so
-            // the block's size is the size to store. The Java string's length is not: under a
-            // double-byte code page one character takes two bytes, and a surrogate pair
-            // becomes one default character, so that length would cut the text short or
-            // read past the block.
+            // The converted bytes plus the terminator. The Java string's length is not the
+            // size: under a double-byte code page one character takes two bytes, and a
+            // surrogate pair becomes one default character, so that length would cut the
+            // text short or read past the block.
             data = reinterpret_cast<const BYTE*>(text.get());
-            size = static_cast<DWORD>(_msize(text.get()));
+            size = static_cast<DWORD>(bytes + 1);
             break;
         }
         case REG_DWORD: {

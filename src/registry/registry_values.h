@@ -39,9 +39,10 @@ void raiseUnlessPending(JNIEnv* env, const char* message);
 
 bool exceptionPending(JNIEnv* env);
 
-// Converts a Java string (never null) to native text. On failure raises "Out of memory"
-// unless the virtual machine already has its error pending, and returns false.
-bool toNativeTextOrRaise(JNIEnv* env, jstring text, NativeText* result);
+// Converts a Java string (never null) to native text, and its byte count without the
+// terminator when asked. On failure raises "Out of memory" unless the virtual machine
+// already has its error pending, and returns false.
+bool toNativeTextOrRaise(JNIEnv* env, jstring text, NativeText* result, size_t* byteCount = nullptr);
 
 // REG_SZ, REG_DWORD, REG_BINARY or REG_NONE (cannot be stored) for a non-null object.
 // REG_NONE with the virtual machine's error pending when a class lookup failed.

@@ -46,7 +46,8 @@ jint runCodec(JNIEnv* env, Codec codec, jbyteArray dst, jint dstSize, jbyteArray
             env->SetByteArrayRegion(dst, 0, copy, reinterpret_cast<const jbyte*>(out.get()));
         }
     }
-    env->ReleaseByteArrayElements(src, source, 0);
+    // Only read: copying the source back would overwrite the output when dst is src.
+    env->ReleaseByteArrayElements(src, source, JNI_ABORT);
     return static_cast<jint>(n);
 }
 
@@ -77,7 +78,7 @@ jint queryHeader(JNIEnv* env, jbyteArray header, Query query) {
         return 0;
     }
     const unsigned int n = query(reinterpret_cast<const unsigned char*>(elements));
-    env->ReleaseByteArrayElements(header, elements, 0);
+    env->ReleaseByteArrayElements(header, elements, JNI_ABORT);  // only read
     return static_cast<jint>(n);
 }
 

@@ -68,7 +68,7 @@ jint JNICALL Java_com_velmor_coreutil_toolkit_VelzipFile_writeDataN(JNIEnv* env,
         return 0;
     }
     outputStream->write(reinterpret_cast<const unsigned char*>(elements), static_cast<unsigned>(length));
-    env->ReleaseByteArrayElements(data, elements, 0);
+    env->ReleaseByteArrayElements(data, elements, JNI_ABORT);  // only read: nothing to copy back
     // A failed block write records nothing: Java's callers test the result alone.
     return outputStream->geterror() == 0 ? 1 : 0;
 }
