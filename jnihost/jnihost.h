@@ -33,7 +33,8 @@ inline constexpr const char* kCoreUtilException = "com/velmor/coreutil/exception
 
 // Behaviour of a Java HackWindowsDirectoryValidator. It runs on the thread that calls
 // "validateDirectory", gets that thread's env and the path; it may throw a Java exception
-// through env->ThrowNew (then its result is ignored, as in Java).
+// through env->ThrowNew. After a throw, the value CallBooleanMethod gives is undefined in
+// JNI: the host gives the function's result unchanged, never a convenient false.
 using ValidatorFn = std::function<bool(JNIEnv* env, const std::string& pathUtf8)>;
 
 // A pending Java exception, as seen from the host.

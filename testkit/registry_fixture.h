@@ -6,7 +6,9 @@
 // - Readers and writers that go straight to ADVAPI32, past the library: to check what the
 //   library really stored (type, exact bytes) and to plant data it could never write itself.
 // - RegistryTest: the JNI host fixture with the six WinRegistry exports bound to the test's
-//   key, and the pending CoreUtilException's message as a plain string.
+//   key, and the pending CoreUtilException's message as a plain string. Every export call
+//   runs under the heap and registry spies, and must leave no key open and no heap block
+//   taken, whatever path it went.
 #pragma once
 
 #include <windows.h>
@@ -17,7 +19,9 @@
 #include <utility>
 #include <vector>
 
+#include "heap_spy.h"
 #include "host_fixture.h"
+#include "registry_spy.h"
 
 namespace regkit {
 
@@ -165,28 +169,53 @@ protected:
     static constexpr const char* kDeleteKey =
         "_Java_com_velmor_coreutil_io_WinRegistry_nativeDeleteRegistryKey@20";
 
+    void SetUp() override {
+        const auto library = static_cast<HMODULE>(lib.handle());
+        ASSERT_TRUE(testkit::heap_spy::install(library));
+        ASSERT_TRUE(testkit::registry_spy::install(library));
+    }
+
+    // Checked when the export call it guards has returned.
+    struct BalanceCheck {
+        const char* exportName;
+        ~BalanceCheck() {
+            EXPECT_EQ(testkit::registry_spy::openKeys(), 0u) << exportName << " left a key open";
+            EXPECT_EQ(testkit::registry_spy::strayCloses(), 0)
+                << exportName << " closed a key it did not open";
+            EXPECT_EQ(testkit::heap_spy::liveBlocks(), 0u) << exportName << " left heap blocks allocated";
+        }
+    };
+    // Calls the export with the spies' records fresh, failing its n-th heap allocation when
+    // failAllocationAt was set (for this call only).
+    template <class R, class... A>
+    R callExport(const char* exportName, A... args) {
+        testkit::registry_spy::clear();
+        testkit::heap_spy::reset();
+        testkit::heap_spy::failAllocation(std::exchange(failAllocationAt, 0));
+        BalanceCheck check{exportName};
+        return lib.call<R>(exportName, jclass{}, args...);
+    }
+
     jstring str(const std::string& utf8) { return vm.newStringUtf8(utf8); }
     // A Java path to a key below the test's own key.
     jstring sub(const std::string& relative) { return str(path + "\\" + relative); }
 
     // The exports with every argument given (root, key path, ...).
     jobject getValue(jint root, jstring keyPath, jstring name) {
-        return lib.call<jobject>(kGetValue, jclass{}, root, keyPath, name);
+        return callExport<jobject>(kGetValue, root, keyPath, name);
     }
-    jobject getValues(jint root, jstring keyPath) {
-        return lib.call<jobject>(kGetValues, jclass{}, root, keyPath);
-    }
+    jobject getValues(jint root, jstring keyPath) { return callExport<jobject>(kGetValues, root, keyPath); }
     void setValue(jint root, jstring keyPath, jstring name, jobject value) {
-        lib.call<void>(kSetValue, jclass{}, root, keyPath, name, value);
+        callExport<void>(kSetValue, root, keyPath, name, value);
     }
     void setValues(jint root, jstring keyPath, jobject table) {
-        lib.call<void>(kSetValues, jclass{}, root, keyPath, table);
+        callExport<void>(kSetValues, root, keyPath, table);
     }
     void deleteValue(jstring keyPath, jstring name) {
-        lib.call<void>(kDeleteValue, jclass{}, regkit::kCurrentUser, keyPath, name);
+        callExport<void>(kDeleteValue, regkit::kCurrentUser, keyPath, name);
     }
     void deleteKey(jstring keyPath, bool recursive) {
-        lib.call<void>(kDeleteKey, jclass{}, regkit::kCurrentUser, keyPath, static_cast<jboolean>(recursive));
+        callExport<void>(kDeleteKey, regkit::kCurrentUser, keyPath, static_cast<jboolean>(recursive));
     }
 
     // The same on the test's own key.
@@ -248,6 +277,7 @@ protected:
         return out;
     }
 
+    int failAllocationAt = 0;  // for the next export call; 0: none fails
     regkit::ScopedTestKey key{::testing::UnitTest::GetInstance()->current_test_info()->name()};
     std::string path = key.path();
     jstring jpath = vm.newStringUtf8(path);

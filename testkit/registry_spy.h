@@ -1,61 +1,99 @@
-// The key handles libTessel_JNI hands to ADVAPI32 when it opens, creates or deletes a key,
-// recorded through its import table (api_spy.h). On 64-bit Windows the predefined keys are
-// 32-bit values sign-extended to pointer width; Wine looks only at their low 32 bits, so a
-// zero-extended root works there and fails on Windows: only the handle itself shows it.
+// What libTessel_JNI hands to ADVAPI32 when it opens and closes registry keys, recorded
+// through its import table (api_spy.h): the parent key and access each RegOpenKeyExA and
+// RegCreateKeyExA is given, and which of the keys it got are still open. The real functions
+// do the work, so the registry changes as it would without the spy. On 64-bit Windows the
+// predefined keys are 32-bit values sign-extended to pointer width; Wine looks only at their
+// low 32 bits, so only the parent handle recorded here shows a zero-extended root.
+//
+// Header-only, like the chooser spies: only the registry tests use it.
 #pragma once
 
 #include <windows.h>
 
 #include <mutex>
+#include <set>
+#include <string>
 #include <vector>
 
 #include "api_spy.h"
 
 namespace testkit::registry_spy {
 
+// One open or create: the path below its parent (a root or a key opened before) and the access.
+struct KeyOpen {
+    HKEY parent;
+    bool created;
+    std::string subKey;
+    REGSAM access;
+    LONG result;
+};
+
 struct Log {
     std::mutex mu;
-    std::vector<HKEY> keys;  // the parent key of each open, create and delete, in order
+    std::vector<KeyOpen> opens;
+    std::set<HKEY> openKeys;  // handed to the library and not closed yet
+    int strayCloses = 0;      // RegCloseKey of a key the library did not get from the two calls
 };
 inline Log recorded;
 
-inline void record(HKEY key) {
+inline LONG record(HKEY parent, bool created, const char* subKey, REGSAM access, LONG result, HKEY key) {
     std::lock_guard<std::mutex> lock(recorded.mu);
-    recorded.keys.push_back(key);
+    recorded.opens.push_back({parent, created, subKey != nullptr ? subKey : "<null>", access, result});
+    if (result == ERROR_SUCCESS) {
+        recorded.openKeys.insert(key);
+    }
+    return result;
 }
 
-inline LONG WINAPI openKey(HKEY key, LPCSTR path, DWORD options, REGSAM access, PHKEY result) {
-    record(key);
-    return RegOpenKeyExA(key, path, options, access, result);
+inline LONG WINAPI openKey(HKEY parent, LPCSTR subKey, DWORD options, REGSAM access, PHKEY key) {
+    const LONG result = RegOpenKeyExA(parent, subKey, options, access, key);
+    return record(parent, false, subKey, access, result, result == ERROR_SUCCESS ? *key : nullptr);
 }
-inline LONG WINAPI createKey(HKEY key, LPCSTR path, DWORD reserved, LPSTR keyClass, DWORD options,
-                             REGSAM access, LPSECURITY_ATTRIBUTES security, PHKEY result,
-                             LPDWORD disposition) {
-    record(key);
-    return RegCreateKeyExA(key, path, reserved, keyClass, options, access, security, result, disposition);
+inline LONG WINAPI createKey(HKEY parent, LPCSTR subKey, DWORD reserved, LPSTR keyClass, DWORD options,
+                             REGSAM access, LPSECURITY_ATTRIBUTES security, PHKEY key, LPDWORD disposition) {
+    const LONG result =
+        RegCreateKeyExA(parent, subKey, reserved, keyClass, options, access, security, key, disposition);
+    return record(parent, true, subKey, access, result, result == ERROR_SUCCESS ? *key : nullptr);
 }
-inline LONG WINAPI deleteKey(HKEY key, LPCSTR path) {
-    record(key);
-    return RegDeleteKeyA(key, path);
-}
-
-// Empties the log and points the library's imports at the spies; false when one is missing.
-inline bool install(HMODULE library) {
+inline LONG WINAPI closeKey(HKEY key) {
     {
         std::lock_guard<std::mutex> lock(recorded.mu);
-        recorded.keys.clear();
+        if (recorded.openKeys.erase(key) == 0) {
+            ++recorded.strayCloses;
+        }
     }
-    return patchImport(library, "RegOpenKeyExA", reinterpret_cast<void*>(openKey)) &&
-           patchImport(library, "RegCreateKeyExA", reinterpret_cast<void*>(createKey)) &&
-           patchImport(library, "RegDeleteKeyA", reinterpret_cast<void*>(deleteKey));
+    return RegCloseKey(key);
 }
 
-// The keys recorded since the last call, and the log emptied.
-inline std::vector<HKEY> take() {
+// Empties the log.
+inline void clear() {
     std::lock_guard<std::mutex> lock(recorded.mu);
-    std::vector<HKEY> keys;
-    keys.swap(recorded.keys);
-    return keys;
+    recorded.opens.clear();
+    recorded.openKeys.clear();
+    recorded.strayCloses = 0;
+}
+
+// Empties the log and points the library's imports at the spies; false when one of the
+// three imports is missing.
+inline bool install(HMODULE library) {
+    clear();
+    return patchImport(library, "RegOpenKeyExA", reinterpret_cast<void*>(openKey)) &&
+           patchImport(library, "RegCreateKeyExA", reinterpret_cast<void*>(createKey)) &&
+           patchImport(library, "RegCloseKey", reinterpret_cast<void*>(closeKey));
+}
+
+// Copies of the log, taken under its lock.
+inline std::vector<KeyOpen> opens() {
+    std::lock_guard<std::mutex> lock(recorded.mu);
+    return recorded.opens;
+}
+inline size_t openKeys() {
+    std::lock_guard<std::mutex> lock(recorded.mu);
+    return recorded.openKeys.size();
+}
+inline int strayCloses() {
+    std::lock_guard<std::mutex> lock(recorded.mu);
+    return recorded.strayCloses;
 }
 
 }  // namespace testkit::registry_spy

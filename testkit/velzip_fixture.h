@@ -20,7 +20,8 @@ protected:
     using Bytes = std::vector<uint8_t>;
 
     ~VelzipTest() override {
-        ZelTest_FailWrites(0);  // a test that injected write failures may have stopped early
+        ZelTest_FailWrites(0);  // a test that injected failures may have stopped early
+        ZelTest_FailReads(0);
         ZelTest_EndLog();
         vz.close();  // the library lets go of its file before the folder is removed
     }

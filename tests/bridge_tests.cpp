@@ -239,6 +239,40 @@ TEST_F(SpecialFolder, DocumentsFolderIsAnExistingPath) {
     EXPECT_TRUE(attributes & FILE_ATTRIBUTE_DIRECTORY);
 }
 
+// What the shell itself answers for a folder id: the path of its item list; "<none>" when
+// the item list has no file-system path.
+std::string shellPathOf(int folderId) {
+    ITEMIDLIST* list = nullptr;
+    if (FAILED(SHGetSpecialFolderLocation(nullptr, folderId, &list)) || list == nullptr) {
+        return "<no item list>";
+    }
+    char path[MAX_PATH] = {};
+    const BOOL found = SHGetPathFromIDListA(list, path);
+    ILFree(list);
+    return found ? path : "<none>";
+}
+
+// Wine's shell ends the documents folder's path with a backslash, where SHGetFolderPathA
+// gives none; the library hands on the item list's path exactly as the shell gave it.
+TEST_F(SpecialFolder, PathIsTheShellsTextAsGivenTrailingBackslashIncluded) {
+    char folderPath[MAX_PATH] = {};
+    ASSERT_EQ(SHGetFolderPathA(nullptr, CSIDL_PERSONAL, nullptr, 0, folderPath), S_OK);
+    const std::string shell = shellPathOf(CSIDL_PERSONAL);
+    ASSERT_EQ(shell, std::string(folderPath) + "\\") << "the test bed's shell gives the backslash";
+    jstring path = lib.call<jstring>(kSpecialFolder, jclass{}, jint{CSIDL_PERSONAL});
+    ASSERT_NE(path, nullptr);
+    EXPECT_EQ(jnihost::utf8(vm.stringValue(path)), shell);
+}
+
+// Control Panel, My Computer and the Recycle Bin: the shell has an item list for each, but
+// no file-system path.
+TEST_F(SpecialFolder, VirtualFolderGivesNull) {
+    for (int id : {CSIDL_CONTROLS, CSIDL_DRIVES, CSIDL_BITBUCKET}) {
+        ASSERT_EQ(shellPathOf(id), "<none>") << id;
+        EXPECT_EQ(lib.call<jstring>(kSpecialFolder, jclass{}, jint{id}), nullptr) << id;
+    }
+}
+
 TEST_F(SpecialFolder, UnknownIdGivesNull) {
     EXPECT_EQ(lib.call<jstring>(kSpecialFolder, jclass{}, jint{0x7ff0}), nullptr);
     EXPECT_EQ(lib.call<jstring>(kSpecialFolder, jclass{}, jint{-1}), nullptr);

@@ -22,6 +22,7 @@
 #include "chooser_client.h"
 #include "chooser_spy.h"
 #include "dialog_driver.h"
+#include "heap_spy.h"
 #include "host_fixture.h"
 #include "screenshot.h"
 
@@ -51,8 +52,13 @@ protected:
     void SetUp() override {
         CoInitialize(nullptr);  // the folder browser's thread must have COM
         ASSERT_TRUE(spy::install(static_cast<HMODULE>(lib.handle())));
+        ASSERT_TRUE(heap_spy::install(static_cast<HMODULE>(lib.handle())));
+        heap_spy::reset();  // counts this thread, the one that shows the dialogs
     }
-    void TearDown() override { CoUninitialize(); }
+    void TearDown() override {
+        CoUninitialize();
+        EXPECT_EQ(heap_spy::liveBlocks(), 0u) << "heap blocks the library did not give back";
+    }
 
     std::string path(const char* name) const { return scratch.child(name); }
     jstring jstr(const std::string& text) { return vm.newStringUtf8(text); }
@@ -341,6 +347,55 @@ TEST_F(FolderBrowser, WithoutValidatorOwnedByTheHiddenWindowAndStatusOnlyToALive
     DestroyWindow(hidden);
 }
 
+// The start path's text is the first allocation of a dialog without title, the validator's
+// Java string of the start folder the second. Either failing leaves the dialog running, and
+// the folder then chosen is not handed on.
+TEST_F(FolderBrowser, AFailedAllocationInACallbackGivesNullThoughAFolderWasChosen) {
+    const size_t startText = path("start").size() + 1;
+    struct Case {
+        const char* what;
+        bool validator;
+        int failAt;
+        size_t failedSize;
+    };
+    const Case cases[] = {
+        {"start path text", false, 1, startText},
+        {"validator's path string", true, 2, startText * sizeof(jchar)},
+    };
+    for (const Case& c : cases) {
+        SCOPED_TRACE(c.what);
+        Paths asked;
+        jnihost::ValidatorFn validator;
+        if (c.validator) {
+            validator = [&](JNIEnv*, const std::string& folderPath) {
+                asked.push_back(folderPath);
+                return true;
+            };
+        }
+        jobject chooser = directoryChooser(path("start"), validator);
+        heap_spy::failAllocation(c.failAt);
+        bool picked = false;
+        jstring result =
+            showWhileDriving([&] { return lib.call<jstring>(kBrowse, chooser); }, byHandle(chooser),
+                             [&](HWND shown) {
+                                 ASSERT_NE(shown, nullptr) << "the dialog runs on";
+                                 picked = selectFolder(shown, path("good"));
+                                 press(shown, IDOK);
+                             });
+        EXPECT_TRUE(picked);
+        EXPECT_EQ(heap_spy::failedSize(), c.failedSize) << "the allocation meant failed";
+        EXPECT_EQ(result, nullptr);
+        EXPECT_EQ(takeException(), "") << "a failed calloc leaves nothing pending";
+        if (c.validator) {
+            EXPECT_EQ(asked, Paths{path("good")}) << "asked again at the next selection";
+        } else {
+            EXPECT_TRUE(spy::sent(BFFM_SETSELECTIONA).empty()) << "no start path to select";
+        }
+    }
+}
+
+// The host hands back the validator's own "true" after its throw, as JNI leaves that value
+// undefined; the library must send a defined 0 instead.
 TEST_F(FolderBrowser, AThrowingValidatorIsAskedOnceAndItsExceptionReachesJava) {
     int calls = 0;
     jobject chooser = directoryChooser(path("start"), [&](JNIEnv* validatorEnv, const std::string&) {

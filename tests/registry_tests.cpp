@@ -3,6 +3,7 @@
 #include <windows.h>
 
 #include <algorithm>
+#include <cstdio>
 #include <functional>
 #include <iterator>
 #include <string>
@@ -189,6 +190,99 @@ TEST_F(Registry, EveryFailureRaisesItsFixedMessage) {
     EXPECT_TRUE(valueNames(path + "\\new").empty());
 }
 
+// Each key is opened with no more access than its use needs: a read with KEY_READ, a value
+// delete with KEY_WRITE, the emptiness test with query and enumerate, the tree walk with
+// DELETE and enumerate; only the writes create with KEY_ALL_ACCESS.
+TEST_F(Registry, EachOpenAsksForTheAccessItsUseNeeds) {
+    setRawValue(path, "v", REG_DWORD, "\1\0\0\0", 4);
+    setRawValue(path + "\\empty");
+    setRawValue(path + "\\valued", "v", REG_DWORD, "\1\0\0\0", 4);
+    setRawValue(path + "\\tree\\child");
+    const std::string open = "open ", create = "create ";
+    auto at = [&](const std::string& relative) { return path + "\\" + relative; };
+    const std::pair<std::function<void()>, std::vector<std::string>> cases[] = {
+        {[&] { get(str("v")); }, {open + path + " 0x20019"}},
+        {[&] { getAll(); }, {open + path + " 0x20019"}},
+        {[&] { set(str("w"), vm.newInteger(2)); }, {create + path + " 0xf003f"}},
+        {[&] {
+             setAll(table({{str("w"), vm.newInteger(3)}}));
+         },
+         {create + path + " 0xf003f"}},
+        {[&] { deleteValue(jpath, str("w")); }, {open + path + " 0x20006"}},
+        {[&] { deleteKey(sub("empty"), false); }, {open + at("empty") + " 0x9"}},
+        // Asked once by the delete and once more by the tree walk, which then opens the key
+        // to enumerate it and asks each sub-key in turn.
+        {[&] { deleteKey(sub("valued"), true); },
+         {open + at("valued") + " 0x9", open + at("valued") + " 0x9", open + at("valued") + " 0x10008"}},
+        {[&] { deleteKey(sub("tree"), true); },
+         {open + at("tree") + " 0x9", open + at("tree") + " 0x9", open + at("tree") + " 0x10008",
+          open + "child 0x9"}},
+    };
+    for (size_t i = 0; i < std::size(cases); ++i) {
+        cases[i].first();
+        EXPECT_EQ(raised(), "") << "case " << i;
+        std::vector<std::string> seen;
+        for (const testkit::registry_spy::KeyOpen& o : testkit::registry_spy::opens()) {
+            char mask[16];
+            std::snprintf(mask, sizeof mask, " 0x%lx", static_cast<unsigned long>(o.access));
+            seen.push_back((o.created ? create : open) + o.subKey + mask);
+        }
+        EXPECT_EQ(seen, cases[i].second) << "case " << i;
+    }
+    EXPECT_EQ(regkit::subKeys(path), 0) << "every delete took place";
+}
+
+// Every heap allocation a call makes fails in turn: each raises "Out of memory" and returns
+// at once, with no key left open and no block left allocated (the fixture checks).
+TEST_F(Registry, EachFailedAllocationRaisesOutOfMemory) {
+    auto prepare = [&] {
+        setRawValue(path, "s", REG_SZ, "text", 5);
+        setRawValue(path, "i", REG_DWORD, "\7\0\0\0", 4);
+        setRawValue(path, "", REG_BINARY, "\1\2", 2);  // the default value
+        setRawValue(path + "\\doomed\\below");
+    };
+    auto none = [](const std::function<void()>& call) {
+        return [call] {
+            call();
+            return jobject{};
+        };
+    };
+    struct Case {
+        const char* what;
+        std::function<jobject()> call;
+        int allocations;
+    };
+    const Case cases[] = {
+        // Path, name, read buffer, then the string made of it.
+        {"text read", [&] { return get(str("s")); }, 4},
+        {"number read", [&] { return get(str("i")); }, 3},
+        {"default bytes read", [&] { return get(nullptr); }, 2},
+        // Path; per value its buffer, a string of a text value, and the name's string.
+        {"bulk read", [&] { return getAll(); }, 8},
+        {"text write", none([&] { set(str("t"), str("new text")); }), 3},
+        {"bulk write", none([&] {
+             setAll(table({{str("t"), str("x")}, {str("n"), vm.newInteger(1)}}));
+         }),
+         4},
+        {"value delete", none([&] { deleteValue(jpath, str("s")); }), 2},
+        {"tree delete", none([&] { deleteKey(sub("doomed"), true); }), 1},
+    };
+    for (const Case& c : cases) {
+        SCOPED_TRACE(c.what);
+        prepare();
+        c.call();
+        EXPECT_EQ(raised(), "");
+        ASSERT_EQ(testkit::heap_spy::allocationCount(), c.allocations);
+        for (int n = 1; n <= c.allocations; ++n) {
+            prepare();
+            failAllocationAt = n;
+            EXPECT_EQ(c.call(), nullptr) << "allocation " << n;
+            EXPECT_EQ(raised(), "Out of memory") << "allocation " << n;
+            EXPECT_GT(testkit::heap_spy::failedSize(), 0u) << "allocation " << n << " was not made";
+        }
+    }
+}
+
 // Where a Java-side lookup or construction fails, the bulk calls clear the virtual machine's
 // error and raise their fixed message; the value conversions return at once with that error
 // pending. Either way nothing is written.
@@ -295,11 +389,12 @@ TEST_F(Registry, RootKeyReachesTheRegistrySignExtendedFromEveryFamily) {
         {"deleteKey", [&] { deleteKey(sub("gone"), false); }},
     };
     for (const auto& [name, run] : families) {
+        spy::clear();
         run();
         EXPECT_EQ(raised(), "") << name;
-        const std::vector<HKEY> keys = spy::take();
-        ASSERT_FALSE(keys.empty()) << name;
-        EXPECT_EQ(keys.front(), HKEY_CURRENT_USER) << name;
+        const std::vector<spy::KeyOpen> opens = spy::opens();
+        ASSERT_FALSE(opens.empty()) << name;
+        EXPECT_EQ(opens.front().parent, HKEY_CURRENT_USER) << name;
     }
     EXPECT_FALSE(keyExists(path + "\\gone"));
 }

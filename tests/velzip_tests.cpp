@@ -268,6 +268,28 @@ TEST_F(VelzipStreamIo, DamagedFilesFailReadsWith13) {
     EXPECT_EQ(vz.errorMsg(), "Error: 5 reading encoded input file.");
 }
 
+// An error that the library reports after delivering bytes, as a disk error can: neither
+// read hands on what it got, both record 13 with the number, and the block read leaves the
+// copied bytes in the array.
+TEST_F(VelzipStreamIo, AnErrorAfterDeliveredBytesFailsBothReadsWith13) {
+    ASSERT_TRUE(vz.writeFile(dir.file("r.vz"), bytes("first line\nsecond\n")));
+    ASSERT_TRUE(vz.open(dir.file("r.vz"), 0));
+    ZelTest_FailReads(Zel::ErrRead);
+    EXPECT_EQ(vz.readLine(), std::nullopt);
+    EXPECT_EQ(vz.errorId(), 13);
+    EXPECT_EQ(vz.errorMsg(), "Error: 1 reading encoded input file.");
+
+    ASSERT_TRUE(vz.open(dir.file("r.vz"), 0));  // from the start, with the record cleared
+    ZelTest_FailReads(Zel::ErrCorrupt);
+    jbyteArray buffer = vm.newByteArray(Bytes(14, 0x55));
+    EXPECT_EQ(vz.readData(buffer, 14), 0);
+    EXPECT_EQ(vz.errorId(), 13);
+    EXPECT_EQ(vz.errorMsg(), "Error: 4 reading encoded input file.");
+    Bytes expected = bytes("first line\n");
+    expected.resize(14, 0x55);
+    EXPECT_EQ(vm.byteArrayValue(buffer), expected);
+}
+
 TEST_F(VelzipStreamIo, BadArgumentsAreRefusedAfterTheStreamCheckBeforeAnyAccess) {
     EXPECT_EQ(vz.writeData(jbyteArray{}, -1), -1) << "no stream comes first";
     EXPECT_EQ(vz.errorId(), 8);

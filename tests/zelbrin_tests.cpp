@@ -111,6 +111,27 @@ TEST_F(Zelbrin, LineModeReadsStopAfterALineFeedOrAtTheRequest) {
     EXPECT_EQ(reads.size(), 3u) << "block mode fills each request";
 }
 
+// The read-failure hook that the bridge's tests use: the bytes and their count arrive, the
+// error comes with them, and the stream itself is not broken by it.
+TEST_F(Zelbrin, AnInjectedReadErrorComesAfterTheBytesDelivered) {
+    writeFile(dir.file("hook.vz"), Bytes{'a', 'b', '\n', 'c', '\n'});
+    Zel::Stream* in = Zel::File::open(dir.file("hook.vz").c_str(), Zel::Stream::Read, true);
+    ASSERT_NE(in, nullptr);
+    unsigned char buffer[8] = {};
+    ZelTest_FailReads(Zel::ErrRead);
+    EXPECT_EQ(in->read(buffer, 8), 3);
+    EXPECT_EQ(in->geterror(), Zel::ErrRead);
+    EXPECT_EQ(std::memcmp(buffer, "ab\n", 3), 0);
+    ZelTest_FailReads(0);
+    EXPECT_EQ(in->read(buffer, 8), 2);
+    EXPECT_EQ(in->geterror(), 0);
+    ZelTest_FailReads(Zel::ErrRead);
+    EXPECT_EQ(in->read(buffer, 8), -1) << "no bytes left: the error alone";
+    EXPECT_EQ(in->geterror(), Zel::ErrRead);
+    ZelTest_FailReads(0);
+    Zel::File::close(in);
+}
+
 // ---- Corrupt and truncated input ----
 
 TEST_F(Zelbrin, DamagedBodiesReadWithAnErrorNeverPastTheData) {

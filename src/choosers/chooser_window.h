@@ -17,6 +17,9 @@ inline constexpr const char kDirectoryChooserClass[] = "com/velmor/coreutil/hack
 struct ChooserContext {
     JNIEnv* env;
     jobject obj;
+    // Set by a callback whose heap allocation failed: the dialog is on screen by then and
+    // runs on, and the exported call gives null when it returns.
+    bool outOfMemory;
 };
 
 // One owner-window search: the process to look for and the first window found.

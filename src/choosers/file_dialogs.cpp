@@ -101,7 +101,7 @@ jobjectArray runFileDialog(FileDialogFunction showDialog, JNIEnv* env, jobject s
     }
     dialog.Flags = kDialogFlags | (multipleSelection ? OFN_ALLOWMULTISELECT : 0);
 
-    ChooserContext context{env, self};
+    ChooserContext context{env, self, false};
     dialog.lCustData = reinterpret_cast<LPARAM>(&context);
     dialog.lpfnHook = fileDialogHook;
 

@@ -59,11 +59,16 @@ int callValidator(JNIEnv* env, jobject validator, const char* path) {
     if (javaPath == nullptr) {
         return -1;
     }
-    // A validator that throws answers false; its exception stays pending for Java.
-    return env->CallBooleanMethod(validator, validate, javaPath) ? 1 : 0;
+    const jboolean valid = env->CallBooleanMethod(validator, validate, javaPath);
+    // After a throw the value returned is undefined: the validator said no, and its
+    // exception stays pending for Java.
+    if (javaErrorPending(env)) {
+        return 0;
+    }
+    return valid ? 1 : 0;
 }
 
-void onBrowseInitialized(JNIEnv* env, jobject obj, HWND dialog) {
+bool onBrowseInitialized(JNIEnv* env, jobject obj, HWND dialog) {
     // First the handle, so that nativeSetStatus reaches the dialog from here on.
     storeWindowHandle(env, obj, kDirectoryChooserClass, dialog);
     centerWindowAt(env, obj, kDirectoryChooserClass, dialog);
@@ -73,40 +78,47 @@ void onBrowseInitialized(JNIEnv* env, jobject obj, HWND dialog) {
         // Sent even for a path that names no folder: the dialog decides what to do with it.
         SendMessageA(dialog, BFFM_SETSELECTIONA, TRUE, reinterpret_cast<LPARAM>(start.get()));
     }
+    return !failed;
 }
 
-void onSelectionChanged(JNIEnv* env, jobject obj, HWND dialog, LPCITEMIDLIST selection) {
+bool onSelectionChanged(JNIEnv* env, jobject obj, HWND dialog, LPCITEMIDLIST selection) {
     // Read at every change, so a validator Java replaces while the dialog is open counts
     // from the next selection on.
     jfieldID field = findFieldByName(env, kDirectoryChooserClass, "validator", kValidatorSignature);
     if (field == nullptr) {
-        return;
+        return true;
     }
     jobject validator = env->GetObjectField(obj, field);
     if (validator == nullptr) {
-        return;  // OK keeps the state the dialog gave it
+        return true;  // OK keeps the state the dialog gave it
     }
     char path[MAX_PATH] = {};
     if (!SHGetPathFromIDListA(selection, path)) {
-        return;  // no file-system path: nothing to ask about
+        return true;  // no file-system path: nothing to ask about
     }
     const int ok = callValidator(env, validator, path);
     if (ok < 0) {
-        return;
+        return false;
     }
     SendMessageA(dialog, BFFM_ENABLEOK, 0, ok);
+    return true;
 }
 
 int CALLBACK browseCallback(HWND dialog, UINT message, LPARAM lParam, LPARAM lpData) {
-    const auto* context = reinterpret_cast<const ChooserContext*>(lpData);
+    auto* context = reinterpret_cast<ChooserContext*>(lpData);
+    bool allocated = true;
     if (message == BFFM_INITIALIZED) {
-        onBrowseInitialized(context->env, context->obj, dialog);
+        allocated = onBrowseInitialized(context->env, context->obj, dialog);
     } else if (message == BFFM_SELCHANGED) {
         // Nothing more is asked of Java once an error is pending: it reaches Java when the
         // dialog returns, and the OK button keeps its last state until then.
         if (!javaErrorPending(context->env)) {
-            onSelectionChanged(context->env, context->obj, dialog, reinterpret_cast<LPCITEMIDLIST>(lParam));
+            allocated = onSelectionChanged(context->env, context->obj, dialog,
+                                           reinterpret_cast<LPCITEMIDLIST>(lParam));
         }
+    }
+    if (!allocated) {
+        context->outOfMemory = true;
     }
     return 0;
 }
@@ -127,7 +139,7 @@ Java_com_velmor_coreutil_hack_HackWindowsDirectoryChooser_nativeBrowseForFolder(
     browse.lpszTitle = title.get();
     browse.ulFlags = static_cast<UINT>(getLongFieldByName(env, self, kDirectoryChooserClass, "browseFlags"));
 
-    ChooserContext context{env, self};
+    ChooserContext context{env, self, false};
     browse.lpfn = browseCallback;
     browse.lParam = reinterpret_cast<LPARAM>(&context);
 
@@ -135,6 +147,11 @@ Java_com_velmor_coreutil_hack_HackWindowsDirectoryChooser_nativeBrowseForFolder(
     title.reset();
     if (!chosen) {
         return nullptr;  // cancel
+    }
+    if (context.outOfMemory) {
+        // Too late to keep the dialog from showing; the choice made without the start path
+        // or the validator's answer is not handed on.
+        return nullptr;
     }
     char path[MAX_PATH] = {};
     if (!SHGetPathFromIDListA(chosen.get(), path)) {
