@@ -20,6 +20,7 @@ struct Record {
     int count = 0;
     int failAt = 0;
     size_t failedSize = 0;
+    size_t slack = 0;
 };
 Record& record() {
     static Record r;  // outlives every DLL that may still call in while the program ends
@@ -53,11 +54,16 @@ void takenBack(uintptr_t address) {
     record().live.erase(address);
 }
 
+size_t slack() {
+    std::lock_guard<std::mutex> lock(record().mu);
+    return record().slack;
+}
+
 void* __cdecl spyMalloc(size_t size) {
-    return countAndDecide(size) ? nullptr : handedOut(std::malloc(size));
+    return countAndDecide(size) ? nullptr : handedOut(std::malloc(size + slack()));
 }
 void* __cdecl spyCalloc(size_t count, size_t size) {
-    return countAndDecide(count * size) ? nullptr : handedOut(std::calloc(count, size));
+    return countAndDecide(count * size) ? nullptr : handedOut(std::calloc(count * size + slack(), 1));
 }
 char* __cdecl spyStrdup(const char* text) {
     return countAndDecide(std::strlen(text) + 1) ? nullptr : static_cast<char*>(handedOut(_strdup(text)));
@@ -107,6 +113,12 @@ void reset() {
     r.count = 0;
     r.failAt = 0;
     r.failedSize = 0;
+    r.slack = 0;
+}
+
+void roundUpBlocks(size_t slack) {
+    std::lock_guard<std::mutex> lock(record().mu);
+    record().slack = slack;
 }
 
 void failAllocation(int n) {

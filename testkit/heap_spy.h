@@ -26,6 +26,10 @@ void reset();
 // The n-th allocation (1: the next) of the counted thread from now on returns null; 0 disarms.
 void failAllocation(int n);
 
+// From now on malloc and calloc hand out blocks `slack` bytes larger than asked, as a heap
+// that rounds sizes up does (its _msize then reports the larger size); reset() ends it.
+void roundUpBlocks(size_t slack);
+
 // Allocations the counted thread made since reset(), the failed one included.
 int allocationCount();
 

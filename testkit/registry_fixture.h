@@ -186,12 +186,13 @@ protected:
         }
     };
     // Calls the export with the spies' records fresh, failing its n-th heap allocation when
-    // failAllocationAt was set (for this call only).
+    // failAllocationAt was set, on a heap rounding blocks up by blockSlack (for this call only).
     template <class R, class... A>
     R callExport(const char* exportName, A... args) {
         testkit::registry_spy::clear();
         testkit::heap_spy::reset();
         testkit::heap_spy::failAllocation(std::exchange(failAllocationAt, 0));
+        testkit::heap_spy::roundUpBlocks(std::exchange(blockSlack, 0));
         BalanceCheck check{exportName};
         return lib.call<R>(exportName, jclass{}, args...);
     }
@@ -278,6 +279,7 @@ protected:
     }
 
     int failAllocationAt = 0;  // for the next export call; 0: none fails
+    size_t blockSlack = 0;     // for the next export call: heap blocks that much larger
     regkit::ScopedTestKey key{::testing::UnitTest::GetInstance()->current_test_info()->name()};
     std::string path = key.path();
     jstring jpath = vm.newStringUtf8(path);

@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <cstdio>
+#include <cstring>
 #include <functional>
 #include <iterator>
 #include <string>
@@ -63,6 +64,18 @@ TEST_F(Registry, EachKindRoundTripsWithItsRegistryType) {
     deleteValue(jpath, nullptr);
     EXPECT_EQ(rawValue(path, "").result, ERROR_FILE_NOT_FOUND);
     EXPECT_EQ(raised(), "");
+}
+
+// A heap may hand out more than it was asked for; the stored text is the converted bytes
+// and one terminator, never the block's size.
+TEST_F(Registry, TextIsStoredAtItsConvertedSizeWhateverTheHeapRoundsTo) {
+    for (const char* text : {"", "a", "seven b", "twelve bytes"}) {
+        blockSlack = 13;
+        set(str("t"), str(text));
+        EXPECT_EQ(raised(), "");
+        Bytes expected(text, text + std::strlen(text) + 1);
+        EXPECT_EQ(rawValue(path, "t").data, expected) << text;
+    }
 }
 
 TEST_F(Registry, StoredDataIsReadWithinItsBytesAndOnlyInTheThreeKinds) {
