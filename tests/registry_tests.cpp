@@ -11,7 +11,6 @@
 #include <vector>
 
 #include "registry_fixture.h"
-#include "registry_spy.h"
 
 namespace {
 
@@ -387,8 +386,6 @@ TEST_F(Registry, DeletesRemoveTheirTargetAndRefuseNonEmptyKeysUnlessRecursive) {
 // are that value sign-extended (HKEY_CURRENT_USER is 0xFFFFFFFF80000001). Wine would accept a
 // zero-extended one too, so the check is on the handle each family hands to ADVAPI32.
 TEST_F(Registry, RootKeyReachesTheRegistrySignExtendedFromEveryFamily) {
-    namespace spy = testkit::registry_spy;
-    ASSERT_TRUE(spy::install(static_cast<HMODULE>(lib.handle())));
     setRawValue(path + "\\gone");
     const std::pair<const char*, std::function<void()>> families[] = {
         {"set", [&] { set(str("v"), str("x")); }},
@@ -402,10 +399,9 @@ TEST_F(Registry, RootKeyReachesTheRegistrySignExtendedFromEveryFamily) {
         {"deleteKey", [&] { deleteKey(sub("gone"), false); }},
     };
     for (const auto& [name, run] : families) {
-        spy::clear();
-        run();
+        run();  // the fixture's spies record each export call afresh
         EXPECT_EQ(raised(), "") << name;
-        const std::vector<spy::KeyOpen> opens = spy::opens();
+        const std::vector<testkit::registry_spy::KeyOpen> opens = testkit::registry_spy::opens();
         ASSERT_FALSE(opens.empty()) << name;
         EXPECT_EQ(opens.front().parent, HKEY_CURRENT_USER) << name;
     }
