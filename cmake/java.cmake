@@ -1,8 +1,8 @@
 # The application's Java classes: compiled into the jar, with the JNI headers generated
 # beside them so that the C++ compiler checks each native function against its Java
-# declaration.
+# declaration. The jar is written by scripts/make-zip, so its bytes depend only on the classes.
 find_program(JAVAC_EXECUTABLE javac REQUIRED)
-find_program(JAR_EXECUTABLE jar REQUIRED)
+find_program(PYTHON3 python3 REQUIRED)
 find_program(JAVAP_EXECUTABLE javap REQUIRED)
 
 get_filename_component(_javac_real ${JAVAC_EXECUTABLE} REALPATH)
@@ -22,9 +22,10 @@ add_custom_command(
   COMMAND ${CMAKE_COMMAND} -E rm -rf ${TESSEL_JAVA_CLASSES} ${TESSEL_JNI_HEADERS}
   COMMAND ${JAVAC_EXECUTABLE} --release 8 -Xlint:all,-options -Werror -encoding UTF-8
           -d ${TESSEL_JAVA_CLASSES} -h ${TESSEL_JNI_HEADERS} ${TESSEL_JAVA_SOURCES}
-  COMMAND ${JAR_EXECUTABLE} cf ${TESSEL_JAR} -C ${TESSEL_JAVA_CLASSES} .
+  COMMAND ${PYTHON3} ${CMAKE_SOURCE_DIR}/scripts/make-zip ${TESSEL_JAR} --manifest ${TESSEL_VERSION}
+          --dir ${TESSEL_JAVA_CLASSES}
   COMMAND ${CMAKE_COMMAND} -E touch ${TESSEL_JNI_HEADERS}/stamp
-  DEPENDS ${TESSEL_JAVA_SOURCES}
+  DEPENDS ${TESSEL_JAVA_SOURCES} ${CMAKE_SOURCE_DIR}/scripts/make-zip ${CMAKE_SOURCE_DIR}/VERSION
   COMMENT "Compiling the Java classes and generating JNI headers")
 add_custom_target(java_classes DEPENDS ${TESSEL_JAR} ${TESSEL_JNI_HEADERS}/stamp)
 

@@ -1,6 +1,5 @@
-// The host side of the JNI host: the classes it knows, the object store, the host-side API
-// used by tests, and Library, which calls the DLL's exports through an assembly thunk so
-// that a wrong argument size (@N) shows up as a reported stack imbalance, not a crash.
+// The host side of the JNI host: the classes it knows, the object store and the host-side
+// API used by tests (Library, which calls the DLL's exports, is in library.cpp).
 #include <windows.h>
 
 #include <pthread.h>
@@ -709,93 +708,6 @@ void Vm::resetCallCounts() {
     for (auto& c : state_->counts)
         c = 0;
     state_->copyBacks = 0;
-}
-
-// ---- Library ----
-
-// uint64_t jnihost_call_stdcall(fn, slots, count, int32_t* imbalance), cdecl.
-// Copies the slots to a 16-byte aligned block on the stack and calls fn. Afterwards ESP
-// should be where a __stdcall callee that popped exactly count*4 bytes leaves it; the
-// difference goes to *imbalance (positive: it popped too much). ESP is restored from EBX.
-extern "C" uint64_t jnihost_call_stdcall(const void* fn, const uint32_t* slots, int count,
-                                         int32_t* imbalance);
-asm(R"(
-    .text
-    .globl _jnihost_call_stdcall
-    .def _jnihost_call_stdcall; .scl 2; .type 32; .endef
-_jnihost_call_stdcall:
-    pushl %ebp
-    movl %esp, %ebp
-    pushl %ebx
-    pushl %esi
-    pushl %edi
-    movl %esp, %ebx
-    movl 16(%ebp), %ecx
-    leal 0(,%ecx,4), %edx
-    subl %edx, %esp
-    andl $-16, %esp
-    leal (%esp,%edx), %edi
-    movl 12(%ebp), %esi
-    xorl %eax, %eax
-1:  cmpl %ecx, %eax
-    jge 2f
-    movl (%esi,%eax,4), %edx
-    movl %edx, (%esp,%eax,4)
-    incl %eax
-    jmp 1b
-2:  call *8(%ebp)
-    movl %esp, %ecx
-    subl %edi, %ecx
-    movl 20(%ebp), %esi
-    movl %ecx, (%esi)
-    movl %ebx, %esp
-    popl %edi
-    popl %esi
-    popl %ebx
-    popl %ebp
-    ret
-)");
-
-Library::Library(Vm& vm, const char* path) : vm_(vm) {
-    module_ = LoadLibraryA(path);
-    if (!module_) {
-        vm_.state().report(std::string("LoadLibraryA(\"") + path + "\") failed, GetLastError " +
-                           std::to_string(GetLastError()));
-    }
-}
-
-Library::~Library() {
-    if (module_)
-        FreeLibrary(static_cast<HMODULE>(module_));
-}
-
-void* Library::find(const char* exportName) const {
-    return module_ ? reinterpret_cast<void*>(GetProcAddress(static_cast<HMODULE>(module_), exportName))
-                   : nullptr;
-}
-
-uint64_t Library::invoke(const char* exportName, const uint32_t* slots, int slotCount) {
-    VmState& s = vm_.state();
-    const void* fn = find(exportName);
-    if (!fn) {
-        s.report(std::string(exportName) + ": " + (module_ ? "no such export" : "the library is not loaded"));
-        return 0;
-    }
-    uint64_t serial;
-    {
-        std::lock_guard<std::recursive_mutex> g(s.mu);
-        serial = s.nextSerial;
-    }
-    int32_t imbalance = 0;
-    const uint64_t result = jnihost_call_stdcall(fn, slots, slotCount, &imbalance);
-    if (imbalance != 0) {
-        s.report(std::string(exportName) + ": stack imbalance of " + std::to_string(imbalance) +
-                 " bytes: the callee popped " + std::to_string(slotCount * 4 + imbalance) + " bytes, its " +
-                 std::to_string(slotCount) + " argument slots take " + std::to_string(slotCount * 4) +
-                 " (wrong @N, or not __stdcall)");
-    }
-    s.afterCall(exportName, GetCurrentThreadId(), serial);
-    return result;
 }
 
 // ---- Text ----

@@ -1,6 +1,6 @@
 // A strict JNI host: a stand-in for the Java virtual machine that loads libTessel_JNI.dll
-// through its real decorated exports and checks the JNI rules the way -Xcheck:jni does.
-// Used by the tests, the tour and the benchmarks.
+// through its real exports (decorated on x86, plain on x64) and checks the JNI rules the way -Xcheck:jni
+// does. Used by the tests, the tour and the benchmarks.
 //
 // Objects live as long as the Vm; a jobject is a handle to one of them. Every thread that
 // calls env() gets its own JNIEnv, and using an env on another thread is a violation.
@@ -129,8 +129,9 @@ private:
     std::unique_ptr<VmState> state_;
 };
 
-// The library under test, loaded with LoadLibraryA and called through its decorated
-// exports ("_Java_..._getCursorPos@8").
+// The library under test, loaded with LoadLibraryA and called through its exports. Callers
+// name an export as a 32-bit JVM finds it ("_Java_..._getCursorPos@8"); a 64-bit host looks
+// it up as a 64-bit JVM does (exportNameFor).
 class Library {
 public:
     explicit Library(Vm& vm, const char* path = "libTessel_JNI.dll");
@@ -142,43 +143,53 @@ public:
     // GetProcAddress of the exact name; null when missing.
     void* find(const char* exportName) const;
 
-    // Calls an export as a __stdcall function of the given result type with the calling
-    // thread's env first and then args (jobject/jclass, jint, jboolean, jlong, references).
-    // Checks: the export exists, the stack is balanced after the call (the callee popped
-    // exactly the bytes the arguments took), and every string and array element block
-    // taken during the call was released exactly once. Failures go to the violation handler.
+    // Calls an export as a JNI function of the given result type with the calling thread's
+    // env first and then args (jobject/jclass, jint, jboolean, jlong, references).
+    // Checks: the export exists, on x86 the stack is balanced after the call (the __stdcall
+    // callee popped exactly the bytes the arguments took), and every string and array
+    // element block taken during the call was released exactly once. Failures go to the
+    // violation handler.
     template <class R, class... A>
     R call(const char* exportName, A... args);
 
 private:
-    uint64_t invoke(const char* exportName, const uint32_t* slots, int slotCount);
+    uint64_t invoke(const char* exportName, const uintptr_t* slots, int slotCount);
 
     Vm& vm_;
     void* module_ = nullptr;
 };
 
+// The name a JVM of this host's architecture binds a native to, given its 32-bit name: on
+// x86 the name itself; on x64 the name without the leading underscore of "_Java_" and
+// without "@N", or, for a native without Java arguments whose plain name is not exported,
+// its JNI long name (name + "__"), the JVM's second try. Null when neither is exported.
+const char* exportNameFor(void* module, const char* x86Name, int javaArgCount, std::string* storage);
+
 namespace detail {
+// One argument in the native width of the calling convention: 4-byte stack slots on x86
+// (a jlong takes two), one 8-byte slot or register per argument on x64. Signed values are
+// sign-extended, as a JVM passes them.
 template <class T>
-void pushSlots(std::vector<uint32_t>& slots, T value) {
+void pushSlots(std::vector<uintptr_t>& slots, T value) {
     static_assert(sizeof(T) == 4 || sizeof(T) == 8 || sizeof(T) == 1, "JNI argument width");
-    if constexpr (sizeof(T) == 8) {
-        uint64_t v;
-        std::memcpy(&v, &value, 8);
-        slots.push_back(static_cast<uint32_t>(v));
-        slots.push_back(static_cast<uint32_t>(v >> 32));
-    } else if constexpr (sizeof(T) == 1) {
-        slots.push_back(static_cast<uint8_t>(value));  // jboolean, jbyte widened to a slot
+    static_assert(!std::is_floating_point_v<T>, "no native of the library takes a float or double");
+    if constexpr (std::is_pointer_v<T>) {
+        slots.push_back(reinterpret_cast<uintptr_t>(value));
+    } else if constexpr (sizeof(T) > sizeof(uintptr_t)) {
+        const auto v = static_cast<uint64_t>(value);
+        slots.push_back(static_cast<uintptr_t>(v));
+        slots.push_back(static_cast<uintptr_t>(v >> 32));
+    } else if constexpr (std::is_signed_v<T>) {
+        slots.push_back(static_cast<uintptr_t>(static_cast<intptr_t>(value)));
     } else {
-        uint32_t v;
-        std::memcpy(&v, &value, 4);
-        slots.push_back(v);
+        slots.push_back(static_cast<uintptr_t>(value));  // jboolean widened to a slot
     }
 }
 }  // namespace detail
 
 template <class R, class... A>
 R Library::call(const char* exportName, A... args) {
-    std::vector<uint32_t> slots;
+    std::vector<uintptr_t> slots;
     detail::pushSlots(slots, vm_.env());
     (detail::pushSlots(slots, args), ...);
     const uint64_t raw = invoke(exportName, slots.data(), static_cast<int>(slots.size()));

@@ -1,7 +1,9 @@
 // What libTessel_JNI hands to ADVAPI32 when it opens and closes registry keys, recorded
-// through its import table (api_spy.h): the access each RegOpenKeyExA and RegCreateKeyExA
-// asks for, and which of the keys it got are still open. The real functions do the work,
-// so the registry changes as it would without the spy.
+// through its import table (api_spy.h): the parent key and access each RegOpenKeyExA and
+// RegCreateKeyExA is given, and which of the keys it got are still open. The real functions
+// do the work, so the registry changes as it would without the spy. On 64-bit Windows the
+// predefined keys are 32-bit values sign-extended to pointer width; Wine looks only at their
+// low 32 bits, so only the parent handle recorded here shows a zero-extended root.
 //
 // Header-only, like the chooser spies: only the registry tests use it.
 #pragma once
@@ -19,6 +21,7 @@ namespace testkit::registry_spy {
 
 // One open or create: the path below its parent (a root or a key opened before) and the access.
 struct KeyOpen {
+    HKEY parent;
     bool created;
     std::string subKey;
     REGSAM access;
@@ -33,9 +36,9 @@ struct Log {
 };
 inline Log recorded;
 
-inline LONG record(bool created, const char* subKey, REGSAM access, LONG result, HKEY key) {
+inline LONG record(HKEY parent, bool created, const char* subKey, REGSAM access, LONG result, HKEY key) {
     std::lock_guard<std::mutex> lock(recorded.mu);
-    recorded.opens.push_back({created, subKey != nullptr ? subKey : "<null>", access, result});
+    recorded.opens.push_back({parent, created, subKey != nullptr ? subKey : "<null>", access, result});
     if (result == ERROR_SUCCESS) {
         recorded.openKeys.insert(key);
     }
@@ -44,13 +47,13 @@ inline LONG record(bool created, const char* subKey, REGSAM access, LONG result,
 
 inline LONG WINAPI openKey(HKEY parent, LPCSTR subKey, DWORD options, REGSAM access, PHKEY key) {
     const LONG result = RegOpenKeyExA(parent, subKey, options, access, key);
-    return record(false, subKey, access, result, result == ERROR_SUCCESS ? *key : nullptr);
+    return record(parent, false, subKey, access, result, result == ERROR_SUCCESS ? *key : nullptr);
 }
 inline LONG WINAPI createKey(HKEY parent, LPCSTR subKey, DWORD reserved, LPSTR keyClass, DWORD options,
                              REGSAM access, LPSECURITY_ATTRIBUTES security, PHKEY key, LPDWORD disposition) {
     const LONG result =
         RegCreateKeyExA(parent, subKey, reserved, keyClass, options, access, security, key, disposition);
-    return record(true, subKey, access, result, result == ERROR_SUCCESS ? *key : nullptr);
+    return record(parent, true, subKey, access, result, result == ERROR_SUCCESS ? *key : nullptr);
 }
 inline LONG WINAPI closeKey(HKEY key) {
     {

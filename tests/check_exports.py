@@ -1,11 +1,14 @@
 #!/usr/bin/env python3
-"""Checks the built DLL's export and import tables against the compiled Java classes.
+"""Checks a built DLL's export and import tables against the compiled Java classes.
 
-The expected names are derived from `javap -s` output, not from the .def file: the JNI
-short name, or the long name for overloaded natives that take arguments, decorated as
-_name@bytes with 4 bytes per slot (8 for the env and object, 8 for a long).
-Then each native is resolved the way a 32-bit Windows JVM looks it up (short decorated
-name first, then long decorated name), and every native must land on its own export.
+The expected names are derived from `javap -s` output, not from the .def files.
+x86: the JNI short name, or the long name for overloaded natives that take arguments,
+decorated as _name@bytes with 4 bytes per slot (8 for the env and object, 8 for a long).
+x64: plain names; without @N the short name of an overload would also be found for its
+other forms, so every form of an overloaded native has its long name (even the one without
+arguments: name__).
+Then each native is resolved the way a Windows JVM of that architecture looks it up (short
+name first, then long name, decorated on x86), and every native must land on its own export.
 """
 import argparse
 import pathlib
@@ -65,7 +68,7 @@ def native_methods(javap, classes_dir):
     return methods
 
 
-def expected_exports(methods):
+def expected_exports(methods, arch):
     counts = {}
     for cls, meth, _ in methods:
         counts[(cls, meth)] = counts.get((cls, meth), 0) + 1
@@ -75,9 +78,14 @@ def expected_exports(methods):
         size = 8 + sum(8 if a in ("J", "D") else 4 for a in args)
         short = "Java_" + mangle(cls) + "_" + mangle(meth)
         long_name = short + "__" + mangle("".join(args))
-        # An overload without arguments keeps the short name; one with arguments is
-        # exported under its long name.
-        chosen = long_name if counts[(cls, meth)] > 1 and args else short
+        overloaded = counts[(cls, meth)] > 1
+        if arch == "x64":
+            chosen = long_name if overloaded else short
+            result[(cls, meth, desc)] = (short, long_name, chosen)
+            continue
+        # An overload without arguments keeps the short name (its @N tells it apart); one
+        # with arguments is exported under its long name.
+        chosen = long_name if overloaded and args else short
         result[(cls, meth, desc)] = ("_%s@%d" % (short, size), "_%s@%d" % (long_name, size),
                                      "_%s@%d" % (chosen, size))
     return result
@@ -104,6 +112,7 @@ def dll_tables(objdump, dll):
 
 def main():
     ap = argparse.ArgumentParser()
+    ap.add_argument("--arch", choices=("x86", "x64"), default="x86")
     ap.add_argument("--dll", required=True)
     ap.add_argument("--classes", required=True)
     ap.add_argument("--javap", required=True)
@@ -114,7 +123,7 @@ def main():
 
     failures = []
     methods = native_methods(a.javap, a.classes)
-    expected = expected_exports(methods)
+    expected = expected_exports(methods, a.arch)
     imports, exports, rvas = dll_tables(a.objdump, a.dll)
 
     designated = {v[2] for v in expected.values()}
@@ -122,7 +131,7 @@ def main():
     for name in sorted(exports - designated):
         failures.append("export not derived from any Java native method: " + name)
 
-    # The lookup a 32-bit Windows JVM makes: short decorated name, then long decorated name.
+    # The lookup a Windows JVM makes: short name, then long name (decorated on x86).
     resolved = {}
     for key, (short, long_name, chosen) in implemented.items():
         hit = short if short in exports else long_name if long_name in exports else None
@@ -137,8 +146,8 @@ def main():
     for dll in sorted(imports - ALLOWED_IMPORTS):
         failures.append("imports a DLL outside the allowed set: " + dll)
 
-    print("%d native methods in the Java classes, %d exported, imports: %s"
-          % (len(expected), len(exports), ", ".join(sorted(imports))))
+    print("%s: %d native methods in the Java classes, %d exported, imports: %s"
+          % (a.arch, len(expected), len(exports), ", ".join(sorted(imports))))
     for name in sorted(exports):
         print("  " + name)
     missing = sorted(v[2] for k, v in expected.items() if v[2] not in exports)

@@ -15,6 +15,16 @@ extern "C" __attribute__((dllexport)) void JNICALL leakUtfChars(JNIEnv* env, jcl
     env->GetStringUTFChars(s, nullptr);
 }
 
+// Two forms of one overloaded native, exported under their JNI long names as the 64-bit
+// library exports its byte counts.
+extern "C" __attribute__((dllexport)) jint JNICALL Java_jnihost_Counts_count__(JNIEnv*, jclass) {
+    return 1;
+}
+extern "C" __attribute__((dllexport)) jint JNICALL Java_jnihost_Counts_count___3B(JNIEnv*, jclass,
+                                                                                  jbyteArray) {
+    return 2;
+}
+
 namespace {
 
 class Host : public ::testing::Test {
@@ -110,15 +120,17 @@ TEST_F(Host, CallsWithAnExceptionPendingAreReported) {
 }
 
 // Calls through exports: kernel32's SetLastError pops the one slot it is given (the env), and
-// GetTickCount pops none, as an export with a wrong @N would; this program's own leaking
-// native is reported when it returns.
+// on x86 GetTickCount pops none, as an export with a wrong @N would (x64 has no stdcall: the
+// caller owns the stack); this program's own leaking native is reported when it returns.
 TEST_F(Host, ExportCallsReportWrongStackSizeMissingExportsAndLeakedBlocks) {
     jnihost::Library kernel(vm, "kernel32.dll");
     kernel.call<void>("SetLastError");
-    EXPECT_EQ(GetLastError(), reinterpret_cast<uintptr_t>(env));
+    EXPECT_EQ(GetLastError(), static_cast<DWORD>(reinterpret_cast<uintptr_t>(env)));
     EXPECT_TRUE(log.none());
+#if !defined(_WIN64)
     kernel.call<uint32_t>("GetTickCount");
     EXPECT_TRUE(log.reported("GetTickCount: stack imbalance of -4 bytes"));
+#endif
     kernel.call<void>("_Java_nothing@8");
     EXPECT_TRUE(log.reported("_Java_nothing@8: no such export"));
 
@@ -129,6 +141,21 @@ TEST_F(Host, ExportCallsReportWrongStackSizeMissingExportsAndLeakedBlocks) {
     EXPECT_TRUE(
         log.reported("leakUtfChars@12: GetStringUTFChars of java/lang/String \"kept\" never released"));
 }
+
+#if defined(_WIN64)
+// A 64-bit JVM tries a native's plain short name, then its long name: the 32-bit names the
+// tests use bind to the long-named forms, the no-argument form to name__.
+TEST_F(Host, X64LookupFallsBackToTheLongNameAsAJvmDoes) {
+    char self[MAX_PATH];
+    ASSERT_GT(GetModuleFileNameA(nullptr, self, sizeof self), 0u);
+    jnihost::Library program(vm, self);
+    EXPECT_EQ(program.call<jint>("_Java_jnihost_Counts_count@8", jclass{}), 1);
+    EXPECT_EQ(program.call<jint>("_Java_jnihost_Counts_count___3B@12", jclass{}, vm.newByteArray({})), 2);
+    EXPECT_EQ(program.call<jint>("_Java_jnihost_Counts_count@12", jclass{}, vm.newByteArray({})), 0);
+    EXPECT_TRUE(log.reported("_Java_jnihost_Counts_count@12: no such export"))
+        << "a form with arguments has no short name to fall back from";
+}
+#endif
 
 TEST_F(Host, MisusedEnvsAndObjectsAreReported) {
     // The choosers' dialogs call back on one thread while Java calls in from another: each

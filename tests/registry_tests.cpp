@@ -391,6 +391,32 @@ TEST_F(Registry, DeletesRemoveTheirTargetAndRefuseNonEmptyKeysUnlessRecursive) {
     EXPECT_EQ(raised(), "");
 }
 
+// The Java int is the root key's 32-bit handle value; on 64-bit Windows the predefined keys
+// are that value sign-extended (HKEY_CURRENT_USER is 0xFFFFFFFF80000001). Wine would accept a
+// zero-extended one too, so the check is on the handle each family hands to ADVAPI32.
+TEST_F(Registry, RootKeyReachesTheRegistrySignExtendedFromEveryFamily) {
+    setRawValue(path + "\\gone");
+    const std::pair<const char*, std::function<void()>> families[] = {
+        {"set", [&] { set(str("v"), str("x")); }},
+        {"setAll",
+         [&] {
+             setAll(table({{str("w"), vm.newInteger(2)}}));
+         }},
+        {"get", [&] { get(str("v")); }},
+        {"getAll", [&] { getAll(); }},
+        {"deleteValue", [&] { deleteValue(jpath, str("v")); }},
+        {"deleteKey", [&] { deleteKey(sub("gone"), false); }},
+    };
+    for (const auto& [name, run] : families) {
+        run();  // the fixture's spies record each export call afresh
+        EXPECT_EQ(raised(), "") << name;
+        const std::vector<testkit::registry_spy::KeyOpen> opens = testkit::registry_spy::opens();
+        ASSERT_FALSE(opens.empty()) << name;
+        EXPECT_EQ(opens.front().parent, HKEY_CURRENT_USER) << name;
+    }
+    EXPECT_FALSE(keyExists(path + "\\gone"));
+}
+
 // Volume: 2,000 values in one call each way, and 1,000 keys (1,110 with the inner ones)
 // removed in one recursive delete.
 TEST_F(Registry, LoadBulkWriteReadAndTreeDelete) {

@@ -35,9 +35,10 @@ inline bool javaErrorPending(JNIEnv* env) {
     return env->ExceptionCheck() == JNI_TRUE;
 }
 
-// Java holds a window handle in a long; only its low 32 bits name the window.
+// Java holds a window handle in a long; only its low 32 bits name the window. Window
+// handles are 32-bit values on 64-bit Windows too, which sign-extends them to pointer width.
 inline HWND windowFromJava(int64_t value) {
-    return reinterpret_cast<HWND>(static_cast<uintptr_t>(static_cast<uint32_t>(value)));
+    return reinterpret_cast<HWND>(static_cast<LONG_PTR>(static_cast<LONG>(value)));
 }
 
 // The field's ID looked up on the class named, or null when the class or field is missing

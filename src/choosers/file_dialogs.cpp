@@ -12,11 +12,15 @@
 
 namespace {
 
-// The 76-byte structure without the three trailing members, which every Windows version
-// since 2000 accepts.
-constexpr DWORD kStructSize = 76;
-static_assert(offsetof(OPENFILENAMEA, lpTemplateName) + sizeof(LPCSTR) == kStructSize,
-              "OPENFILENAMEA layout");
+// The structure without the three trailing members (OPENFILENAME_SIZE_VERSION_400A), which
+// every Windows version since 2000 accepts: 76 bytes on x86, the same fields at 64-bit width
+// on x64.
+constexpr DWORD kStructSize = offsetof(OPENFILENAMEA, lpTemplateName) + sizeof(LPCSTR);
+#if defined(_WIN64)
+static_assert(kStructSize == 136, "OPENFILENAMEA of 64-bit Windows, old version");
+#else
+static_assert(kStructSize == 76, "OPENFILENAMEA of 32-bit Windows, old version");
+#endif
 
 // Room for a long multiple selection; Windows fails the dialog when the names do not fit.
 constexpr DWORD kFileBufferSize = 10000;

@@ -11,7 +11,11 @@
 
 namespace {
 
+#if defined(_WIN64)
+static_assert(sizeof(BROWSEINFOA) == 64, "BROWSEINFOA of 64-bit Windows");
+#else
 static_assert(sizeof(BROWSEINFOA) == 32, "BROWSEINFOA of 32-bit Windows");
+#endif
 
 const char kValidatorInterface[] = "com/velmor/coreutil/hack/HackWindowsDirectoryValidator";
 const char kValidatorSignature[] = "Lcom/velmor/coreutil/hack/HackWindowsDirectoryValidator;";
