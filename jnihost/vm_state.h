@@ -1,5 +1,5 @@
-// Internals of the JNI host shared by the host-side API (jnihost.cpp) and the JNI function
-// table (jni_functions.cpp). Tests use jnihost.h only.
+// Internals of the JNI host shared by its host side (vm_*.cpp, host_*.cpp, library.cpp) and
+// the JNIEnv function table (jni_*.cpp). Tests use jnihost.h only.
 #pragma once
 
 #include "jnihost.h"
@@ -100,6 +100,14 @@ struct HostEnv {
 };
 
 const JNINativeInterface_* functionTable();
+
+// Live envs and Vms: a JNIEnv pointer is checked against them before it is used.
+struct Registry {
+    std::mutex mu;
+    std::unordered_set<const void*> envs;
+    std::vector<VmState*> vms;
+};
+Registry& registry();
 // The host env behind a JNIEnv pointer, or null when it is not a live env of any Vm.
 HostEnv* lookupEnv(const void* env);
 // A JNI function got an env that is not ours: reported to the newest Vm (or stderr).
@@ -177,6 +185,9 @@ inline jvalue jv(const Obj* o) {
     v.l = handle(o);
     return v;
 }
+
+// Every host-side API function that touches the Vm's objects holds its lock.
+#define HOST_LOCK std::lock_guard<std::recursive_mutex> hostLock(state_->mu)
 
 std::string hex(const void* p);
 // Here so that the JNI function table need not include <windows.h>, whose names clash.
