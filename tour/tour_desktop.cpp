@@ -16,7 +16,8 @@ void tourDesktop(jnihost::Vm& vm, jnihost::Library& lib) {
     }
 
     for (const char* variable : {"WINEPREFIX", "TESSEL_UNDEFINED_VARIABLE"}) {
-        jstring value = lib.call<jstring>(name("getEnvVariable@12").c_str(), jclass{}, vm.newStringUtf8(variable));
+        jstring value =
+            lib.call<jstring>(name("getEnvVariable@12").c_str(), jclass{}, vm.newStringUtf8(variable));
         std::printf("  getEnvVariable(\"%s\") -> %s\n", variable,
                     value ? ("\"" + vm.stringUtf8(value) + "\"").c_str() : "null");
     }
